@@ -1,0 +1,11 @@
+# Warnings for the project's own targets.
+add_library(vorn_warnings INTERFACE)
+target_compile_options(vorn_warnings INTERFACE
+  -Wall -Wextra -Wpedantic -Wconversion -Wsign-conversion -Wshadow -Wold-style-cast -Wcast-qual -Wcast-align
+  -Wformat=2 -Wnull-dereference -Wundef -Wnon-virtual-dtor -Woverloaded-virtual -Wdouble-promotion
+  $<$<CXX_COMPILER_ID:GNU>:-Wduplicated-cond -Wduplicated-branches -Wlogical-op -Wuseless-cast>)
+
+option(VORN_WERROR "Treat warnings as errors" OFF)
+if(VORN_WERROR)
+  target_compile_options(vorn_warnings INTERFACE -Werror)
+endif()
