@@ -89,11 +89,12 @@ int VLIBCFileExist(const char* path);
 // Failure: -1.
 int VLIBCFileTouch(const char* path);
 
-// Takes the lock that `word` names, waiting up to `seconds`. 0 when the lock is held.
+// Takes the lock that `word` names in the bits above its lowest byte, in the way that the lowest byte asks for, waiting
+// up to `seconds`. 0 when the lock is held.
 // Failure: -1, 1.
 int VLIBCFileLock(int word, int seconds);
 
-// Gives the lock that `word` names back.
+// Gives the lock that `word` names back; the lowest byte does not count.
 // Failure: -1.
 int VLIBCFileUnlock(int word);
 

@@ -35,7 +35,7 @@ int WINIQuery1(char* name, int size, int* first, int* second);
 // Failure: -1.
 int ErrWINIState1Get(char* key, int keySize, char* message, int messageSize);
 
-// Joins or leaves as the record says. 0 when done.
+// Joins or leaves as the record says. 0 when done. A record in which one of the three texts is null is refused.
 // Failure: -1, 1.
 int VORNWinJoin1(struct _tag_VORN_WIN2_* record);
 

@@ -104,8 +104,8 @@ public:
     // Failure: false, throws.
     bool List(const std::string& prefix, const Json::Value& groups, Json::Value& tasks);
 
-    // Fills `status` with the record of a task: "finish" (bool), "success" (bool), "data" (what the body published
-    // last), and "error" with "code" (int) and "errors" when the task failed.
+    // Fills `status` with the record of a task: "finish" (bool), "success" (bool, false only once the task has failed),
+    // "data" (what the body published last), and "error" with "code" (int) and "errors" when the task failed.
     // Failure: false, throws.
     bool Status(const std::string& id, Json::Value& status);
 

@@ -51,7 +51,7 @@ void ModuleTest::BeMember() {
     state.secondFlag = 1;
     state.joinedFlag = 1;
     state.adsJoined = 1;
-    state.files[kSmbConfPath]["global"] = {{"security", "ads"}, {"workgroup", "LAB"}, {"realm", "LAB.TEST"}};
+    state.keyValueFiles[kSmbConfPath]["global"] = {{"security", "ads"}, {"workgroup", "LAB"}, {"realm", "LAB.TEST"}};
 }
 
 ::testing::Matcher<const fake::Answer&> Succeeds(const std::string& json) {
