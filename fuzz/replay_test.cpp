@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -25,7 +25,9 @@ std::vector<std::filesystem::path> FilesOf(const std::filesystem::path& folder) 
 
 std::string Content(const std::filesystem::path& path) {
     std::ifstream stream(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(stream), std::istreambuf_iterator<char>()};
+    std::ostringstream content;
+    content << stream.rdbuf();
+    return content.str();
 }
 
 class Corpus : public ::testing::TestWithParam<std::string> {};
@@ -52,6 +54,7 @@ std::vector<std::string> Names() {
     return names;
 }
 
-INSTANTIATE_TEST_SUITE_P(Operations, Corpus, ::testing::ValuesIn(Names()), [](const auto& info) { return info.param; });
+INSTANTIATE_TEST_SUITE_P(Operations, Corpus, ::testing::ValuesIn(Names()),
+                         [](const auto& operation) { return operation.param; });
 
 }  // namespace
