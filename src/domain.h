@@ -38,7 +38,7 @@ public:
 
     // ---- domain/membership_state.cpp: is the appliance a member? ----
     static constexpr int kNameSize = 128;
-    // `name` is empty unless the appliance is a member. Records 2622 on failure.
+    // `name` holds the name of the domain, or of the workgroup when it is no member. Records 2622 on failure.
     bool LoadMembership(bool& isMember, char (&name)[kNameSize]);
 
     // ---- domain/status.cpp: "get" ----

@@ -70,8 +70,7 @@ bool DomainServiceHandler::SaveDomainWorkgroup() {
 }
 
 bool DomainServiceHandler::LeaveDomain() {
-    _tag_VORN_WIN2_ record{};
-    record.joinMode = 0;
+    _tag_VORN_WIN2_ record{};  // with join mode 0: back to a workgroup
     record.domainName = kWorkgroup;
     record.userName = "";
     record.password = "";

@@ -35,7 +35,7 @@ protected:
 };
 
 TEST_F(RecorderTest, KeepsCallsInTheirOrder) {
-    char value[128];
+    char value[128] = {};
     fake::Exchange exchange;
     VLIBCFileGetKeyValue("/usr/vorn/etc/smb.conf", "security", value, sizeof value, 0);
     syslog(LOG_ERR, "%s:%d no \"%s\"", "status.cpp", 12, "key");

@@ -132,11 +132,14 @@ void Recording::Spoil(char* buffer, int size) {
 }
 
 bool Recording::BadBuffer(const char* buffer, int size) {
-    if (buffer != nullptr && size > 0) {
-        return false;
+    if (buffer == nullptr || size <= 0) {
+        Misuse("no buffer");
+        return true;
     }
-    Misuse("no buffer");
-    return true;
+    if (std::any_of(buffer, buffer + size, [](char byte) { return byte != '\0'; })) {
+        Misuse("a buffer that isn't zeroed");
+    }
+    return false;
 }
 
 void Recording::Misuse(const std::string& text) {

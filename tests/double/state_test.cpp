@@ -41,7 +41,7 @@ protected:
 
 TEST_F(StateTest, FillsTheWholeBuffer) {
     state.keyValueFiles["/f"]["a"] = {{"key", "value"}};
-    char value[8];
+    char value[8] = {};
     std::fill(std::begin(value), std::end(value), 'x');
     EXPECT_EQ(VLIBCFileGetKeyValue("/f", "KEY", value, sizeof value, 0), 5);
     EXPECT_EQ(std::string(value, sizeof value), std::string("value\0ZZ", 8));
@@ -52,9 +52,17 @@ TEST_F(StateTest, FillsTheWholeBuffer) {
     EXPECT_EQ(VLIBCFileGetKeyValue("/none", "key", value, sizeof value, 0), -1);
 }
 
+TEST_F(StateTest, TakesABufferThatIsNotZeroedForAMisuse) {
+    char name[8] = {};
+    VORNWorkgroupGet(name, sizeof name);
+    EXPECT_TRUE(TheAppliance().Misuses().empty());
+    VORNWorkgroupGet(name, sizeof name);
+    EXPECT_EQ(TheAppliance().Misuses().size(), 1U);
+}
+
 TEST_F(StateTest, WritesASectionAndMovesTheFile) {
     state.keyValueFiles["/f"]["global"] = {{"old", "1"}};
-    char name[64];
+    char name[64] = {};
     ASSERT_EQ(VLIBCFileITmpName("/f", name, sizeof name), 0);
     VLIBSZHASH* hash = VLIBCSzHashAlloc(2);
     VLIBCSzHashSetValue(&hash, "b", "2");
@@ -107,7 +115,7 @@ TEST_F(StateTest, JoinsAndLeaves) {
     record.password = "secret";
     std::strcpy(record.netbiosName, "EXAMPLE");
     EXPECT_EQ(VORNWinJoin1(&record), 0);
-    char name[32];
+    char name[32] = {};
     int first = 0;
     EXPECT_EQ(WINIQuery1(name, sizeof name, &first, nullptr), 0);
     EXPECT_STREQ(name, "example.test");
@@ -153,7 +161,7 @@ TEST_F(StateTest, SavesAndFindsScheduledTasks) {
 
     _tag_vorn_sched_task_* list = nullptr;
     const auto refresh = [](_tag_vorn_sched_task_* candidate) {
-        char command[16];
+        char command[16] = {};
         const bool read = candidate != nullptr && VORNSchedCTaskGetCommand(command, sizeof command, candidate) == 0;
         return read && std::strcmp(command, "refresh") == 0 ? 1 : 0;
     };

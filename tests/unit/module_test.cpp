@@ -34,6 +34,11 @@ void ModuleTest::TearDown() {
     EXPECT_THAT(appliance.Misuses(), IsEmpty());
 }
 
+void ModuleTest::Restart() {
+    ModuleTest::TearDown();
+    appliance.Reset();
+}
+
 fake::Answer ModuleTest::Call(VORN::APIFunction function, const Json::Value& parameters) {
     const std::size_t before = appliance.Answers().size();
     fake::Exchange exchange(parameters);

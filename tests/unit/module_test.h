@@ -30,6 +30,9 @@ protected:
     ModuleTest();
     void TearDown() override;
 
+    // What TearDown checks, and a fresh appliance: for tests that go through many cases.
+    void Restart();
+
     // Calls an entry function and returns the only answer that it gave.
     fake::Answer Call(VORN::APIFunction function, const Json::Value& parameters = Json::Value(Json::objectValue));
 

@@ -48,9 +48,16 @@ TEST_F(TestDC, NeedsBothFlagsOfAMember) {
     EXPECT_EQ(appliance.CountOf("VORNWinTestJoin"), 0);
 }
 
+TEST_F(TestDC, TakesAnyFlagsButZeroForAMember) {
+    BeMember();
+    state.firstFlag = -1;
+    state.secondFlag = 2;
+    EXPECT_THAT(Call(DomainTestDC), Succeeds(R"({"test_join_success": true})"));
+}
+
 TEST_F(TestDC, IsFalseOnAModelWithoutDomainSupport) {
     BeMember();
-    for (const char* capability : {"no", "", "yess", "ye", " yes"}) {
+    for (const char* capability : {"no", "", "yess", "ye", " yes", "yes ", "1"}) {
         state.capabilities["supportdomain"] = capability;
         EXPECT_THAT(Call(DomainTestDC), Succeeds(R"({"test_join_success": false})")) << capability;
     }
@@ -74,12 +81,27 @@ TEST_F(TestDC, Answers2622WhenTheStateCannotBeRead) {
                                                    "Failed to get domain info." + LastErrorText(state))));
 }
 
+TEST_F(TestDC, APositiveResultOfTheReadIsNoFailure) {
+    BeMember();
+    appliance.FailNth("WINIQuery1", 1, fake::Fault::Result(1));
+    EXPECT_THAT(Call(DomainTestDC), Succeeds(R"({"test_join_success": true})"));
+}
+
+TEST_F(TestDC, ReadsNoParametersAndChangesNothing) {
+    BeMember();
+    Call(DomainTestDC, unit::FromJson(R"({"test_join_success": false})"));
+    EXPECT_THAT(appliance.CallTexts(),
+                ElementsAre("VornConf::VornConf()", R"(VornConf::Def("supportdomain", ""))", "VornConf::~VornConf()",
+                            "WINIQuery1(size 128, first, second)", "VORNWinADSJoined()", "VORNWinTestJoin(1)",
+                            R"(VORN::APIResponse::SetSuccess({"test_join_success":true}))"));
+}
+
 TEST_F(TestDC, HandsTheKindOfMembershipOnUnchanged) {
     BeMember();
     state.adsJoined = 7;
     Call(DomainTestDC);
     EXPECT_THAT(appliance.CallTexts(fake::kAllBookkeeping),
-                ElementsAre(R"(VornConf::Def("supportdomain", ""))", "WINIQuery1(size 128, flag, flag)",
+                ElementsAre(R"(VornConf::Def("supportdomain", ""))", "WINIQuery1(size 128, first, second)",
                             "VORNWinADSJoined()", "VORNWinTestJoin(7)"));
 }
 

@@ -1,0 +1,192 @@
+// Every log statement is told by its unit and its number: the sources held against the list in support/log.h.
+
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <map>
+#include <regex>
+#include <set>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "src/api_table.h"
+#include "src/support/log.h"
+#include "tests/unit/module_test.h"
+
+namespace {
+
+std::string ReadAll(const std::filesystem::path& path) {
+    std::ifstream stream(path);
+    return {std::istreambuf_iterator<char>(stream), std::istreambuf_iterator<char>()};
+}
+
+std::vector<std::string> Lines(const std::string& text) {
+    std::istringstream stream(text);
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(stream, line);) {
+        lines.push_back(line);
+    }
+    return lines;
+}
+
+const std::filesystem::path& SourceFolder() {
+    static const std::filesystem::path folder = VORN_SOURCE_DIR;
+    return folder;
+}
+
+// The text of each source file, by its path below the source folder; log.h, which only declares, is left out.
+std::map<std::string, std::string> Sources() {
+    std::map<std::string, std::string> sources;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(SourceFolder())) {
+        const std::string name = entry.path().lexically_relative(SourceFolder()).generic_string();
+        if ((entry.path().extension() == ".cpp" || entry.path().extension() == ".h") && name != "support/log.h") {
+            sources[name] = ReadAll(entry.path());
+        }
+    }
+    return sources;
+}
+
+std::vector<std::smatch> Matches(const std::string& text, const std::regex& pattern) {
+    return {std::sregex_iterator(text.begin(), text.end(), pattern), std::sregex_iterator()};
+}
+
+// The enumerators of the list: name, number, file.
+struct ListedFile {
+    std::string enumerator;
+    int number;
+    std::string file;
+};
+
+std::vector<ListedFile> ListedFiles() {
+    const std::string text = ReadAll(SourceFolder() / "support/log.h");
+    static const std::regex pattern(R"(\n    (k\w+) = (\d+), +// ([\w/]+\.cpp)\b)");
+    std::vector<ListedFile> listed;
+    for (const std::smatch& match : Matches(text, pattern)) {
+        listed.push_back({match[1], std::stoi(match[2]), match[3]});
+    }
+    return listed;
+}
+
+// Each call of syslog in a text, from its name to the end of the statement.
+std::vector<std::string> LogStatements(const std::string& text) {
+    std::vector<std::string> statements;
+    for (std::size_t at = text.find("syslog("); at != std::string::npos; at = text.find("syslog(", at + 1)) {
+        statements.push_back(text.substr(at, text.find(");\n", at) - at));
+    }
+    return statements;
+}
+
+std::set<std::string> UsedEnumerators(const std::string& text) {
+    static const std::regex pattern(R"(LOG_NUMBER\((\w+)\))");
+    std::set<std::string> used;
+    for (const std::smatch& match : Matches(text, pattern)) {
+        used.insert(match[1]);
+    }
+    return used;
+}
+
+TEST(LogNumbers, ANumberIsMadeOfTheFileAndTheLine) {
+    EXPECT_EQ(LogNumber(LogFile::kHandlerRules, 1), 1001);
+    EXPECT_EQ(LogNumber(LogFile::kJoin, 42), 6042);
+    EXPECT_EQ(LogNumber(LogFile::kScheduleStore, 999), 14999);
+}
+
+// Readers of the log know these.
+TEST(LogNumbers, TheUnitsKeepTheirNames) {
+    EXPECT_STREQ(kDomainUnit, "domain.cpp");
+    EXPECT_STREQ(kScheduleUnit, "domain_schedule.cpp");
+}
+
+TEST(LogNumbers, TheFilesAreNumberedFromOneOnWithoutAGap) {
+    const std::vector<ListedFile> listed = ListedFiles();
+    ASSERT_FALSE(listed.empty());
+    for (std::size_t index = 0; index < listed.size(); ++index) {
+        EXPECT_EQ(listed[index].number, static_cast<int>(index) + 1) << listed[index].enumerator;
+    }
+}
+
+TEST(LogNumbers, EachFileThatLogsUsesItsOwnEntryOfTheList) {
+    std::map<std::string, std::set<std::string>> listed;
+    for (const ListedFile& entry : ListedFiles()) {
+        EXPECT_TRUE(listed[entry.file].insert(entry.enumerator).second);
+    }
+    std::map<std::string, std::set<std::string>> used;
+    for (const auto& [name, text] : Sources()) {
+        const std::set<std::string> enumerators = UsedEnumerators(text);
+        EXPECT_LE(enumerators.size(), 1U) << name;
+        if (!enumerators.empty()) {
+            used[name] = enumerators;
+        }
+    }
+    EXPECT_EQ(used, listed);
+}
+
+TEST(LogNumbers, NoTwoLogStatementsShareANumber) {
+    static const std::regex number(R"(LOG_NUMBER\()");
+    for (const auto& [name, text] : Sources()) {
+        const std::vector<std::string> lines = Lines(text);
+        EXPECT_LT(lines.size(), static_cast<std::size_t>(kLogLinesPerFile)) << name;
+        std::size_t numbers = 0;
+        for (std::size_t index = 0; index < lines.size(); ++index) {
+            const std::size_t inLine = Matches(lines[index], number).size();
+            EXPECT_LE(inLine, 1U) << name << ":" << index + 1;
+            numbers += inLine;
+        }
+        EXPECT_EQ(numbers, LogStatements(text).size()) << name;
+    }
+}
+
+TEST(LogNumbers, EachLogStatementHasErrorPriorityAndBeginsWithUnitAndNumber) {
+    static const std::regex form(
+        R"re(syslog\(LOG_ERR,\s+"%s:%d [^"]+",\s+(kDomainUnit|kScheduleUnit|unit),\s+(LOG_NUMBER\(\w+\)|number)[\s\S]*)re");
+    std::size_t statements = 0;
+    for (const auto& [name, text] : Sources()) {
+        for (const std::string& statement : LogStatements(text)) {
+            EXPECT_TRUE(std::regex_match(statement, form)) << name << ": " << statement;
+            ++statements;
+        }
+    }
+    EXPECT_GT(statements, 0U);
+}
+
+TEST(LogNumbers, NothingIsLoggedInAnotherWay) {
+    static const std::regex others(R"(\b(v?f?printf|vsyslog|perror|f?puts|openlog|closelog)\(|\b(cout|cerr|clog)\b)");
+    static const std::regex any(R"(\bsyslog\b)");
+    for (const auto& [name, text] : Sources()) {
+        EXPECT_FALSE(std::regex_search(text, others)) << name;
+        EXPECT_EQ(Matches(text, any).size(), LogStatements(text).size()) << name;
+    }
+}
+
+class WrittenLines : public unit::ModuleTest {};
+
+// Takes the numbers of lines that were really written back to the source.
+TEST_F(WrittenLines, TheNumberLeadsToTheStatement) {
+    appliance.FailNth("WINIQuery1", 1, fake::Fault::Result(-1));
+    Call(DomainTestDC);
+    Call(DomainSet);
+    Call(DomainScheduleSet);
+    Call(DomainScheduleSet, unit::FromJson(R"({"date_type": 9, "hour": 1, "min": 1})"));
+    state.supports.clear();
+    Call(DomainUpdateStart);
+    state.capabilities.clear();
+    Call(DomainGetDomainList);
+    ASSERT_EQ(appliance.Logs().size(), 6U);
+    const std::vector<ListedFile> listed = ListedFiles();
+    for (const fake::LogLine& line : appliance.Logs()) {
+        const auto file = static_cast<std::size_t>(line.line / kLogLinesPerFile);
+        const auto place = static_cast<std::size_t>(line.line % kLogLinesPerFile);
+        ASSERT_GE(file, 1U) << line.message;
+        ASSERT_LE(file, listed.size()) << line.message;
+        const std::vector<std::string> lines = Lines(ReadAll(SourceFolder() / listed[file - 1].file));
+        ASSERT_GE(place, 2U) << line.message;
+        ASSERT_LE(place, lines.size()) << line.message;
+        EXPECT_NE(lines[place - 1].find("LOG_NUMBER(" + listed[file - 1].enumerator + ")"), std::string::npos);
+        // The statement may begin one line above the number.
+        const std::string statement = lines[place - 2] + lines[place - 1];
+        EXPECT_NE(statement.find(line.format), std::string::npos) << statement;
+    }
+}
+
+}  // namespace
