@@ -71,6 +71,10 @@ TEST_F(Interfaces, AreSplitAtCommasAndNotTrimmed) {
     }
 }
 
+TEST_F(Interfaces, MayBeginWithAnyByte) {
+    EXPECT_THAT(Pieces("\xC3\xA9th0,\x01"), ElementsAre("\xC3\xA9th0", "\x01"));
+}
+
 TEST_F(Interfaces, ReplaceWhatTheArrayHeld) {
     for (const char* before : {"null", R"("text")", R"(["eth7", "eth8"])", "{}"}) {
         Json::Value nics = FromJson(before);
