@@ -1,6 +1,7 @@
 // "set" of "disable_domain_admins": on a member, a change is followed by what the platform does about the
 // administrators' group.
 
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -223,6 +224,22 @@ TEST_F(OptionUpdate, OfANumberTellsWhetherItChanged) {
     EXPECT_TRUE(missing.handler.UpdateIntConf(&hash, "number", "key"));
     EXPECT_EQ(Value(), "0");
     EXPECT_FALSE(missing.handler.UpdateIntConf(&hash, "number", "key"));
+}
+
+TEST_F(OptionUpdate, ReadsTheRequestFirst) {
+    Step step(R"({"x": true, "y": 3})");
+    const std::size_t before = appliance.Calls().size();
+    step.handler.UpdateBoolConf(&hash, "x", "bool");
+    step.handler.UpdateIntConf(&hash, "y", "int");
+    step.handler.UpdateDisableAdminConf(&hash, "x", "admins");
+    std::vector<std::string> calls = appliance.CallTexts();
+    calls.erase(calls.begin(), calls.begin() + static_cast<std::ptrdiff_t>(before));
+    EXPECT_THAT(calls,
+                ElementsAre(R"(VORN::APIRequest::GetParam("x", null))", R"(VLIBCSzHashGetValue(hash, "bool"))",
+                            R"(VLIBCSzHashSetValue(hash, "bool", "yes"))", R"(VORN::APIRequest::GetParam("y", null))",
+                            R"(VLIBCSzHashGetValue(hash, "int"))", R"(VLIBCSzHashSetValue(hash, "int", "3"))",
+                            R"(VORN::APIRequest::GetParam("x", null))", "VORNWinsIsJoined()",
+                            R"(VLIBCSzHashGetValue(hash, "admins"))", R"(VLIBCSzHashSetValue(hash, "admins", "yes"))"));
 }
 
 TEST_F(OptionUpdate, GoesOnWithAHashThatMoved) {

@@ -1,0 +1,37 @@
+# ./dev clean: removes what was built.
+# shellcheck shell=bash
+
+usage() {
+    cat <<'TEXT'
+usage: ./dev clean [--all]
+
+Removes what was built, with its logs and reports. Kept are inputs that a fuzzer found (build/fuzz-found) and the bare
+Debian root of "./dev fresh" (build/fresh).
+
+  --all   removes those as well
+TEXT
+}
+
+main() {
+    local all=false
+    case ${1:-} in
+        -h | --help)
+            usage
+            return
+            ;;
+        --all) all=true ;;
+        '') ;;
+        *) wrong_usage "\"clean\" takes no \"$1\"." ;;
+    esac
+    if [[ ! -d build ]]; then
+        say "ok: there is nothing to remove"
+        return
+    fi
+    if $all; then
+        rm -rf --one-file-system -- build
+    else
+        find build -mindepth 1 -maxdepth 1 ! -name fuzz-found ! -name fresh -exec rm -rf --one-file-system -- {} +
+        rmdir --ignore-fail-on-non-empty build
+    fi
+    say "ok: removed what was built"
+}

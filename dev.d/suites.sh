@@ -1,0 +1,185 @@
+# The suites of "./dev test". Each one runs as a process of its own (suite.sh) and leaves its counts with "count".
+# shellcheck shell=bash disable=SC2034,SC2153 # variables shared with the files that read this one
+
+SUITES=(format shell clang lint unit corpus sweep threads coverage library)
+QUICK_SUITES=(format shell unit corpus library)
+
+about_suite() {
+    case $1 in
+        format) say "the C++ sources are formatted as .clang-format says" ;;
+        shell) say "shellcheck finds nothing in the scripts" ;;
+        clang) say "clang compiles the module without a warning" ;;
+        lint) say "clang-tidy finds nothing in src/" ;;
+        unit) say "unit tests, with address and undefined-behaviour sanitizers" ;;
+        corpus) say "the fuzzers' inputs as ordinary tests, with the same sanitizers" ;;
+        sweep) say "every call of the appliance fails once in every scenario, with the same sanitizers" ;;
+        threads) say "requests on several threads, with the thread sanitizer" ;;
+        coverage) say "the unit tests reach every line and every branch of src/" ;;
+        library) say "the built library: symbols, linking, loading, all operations in a host" ;;
+    esac
+}
+
+# Long enough for two slow cores, and short enough that nothing hangs for an hour.
+deadline_of_suite() {
+    case $1 in
+        format | shell) say 300 ;;
+        clang | corpus | library) say 900 ;;
+        *) say 2400 ;;
+    esac
+}
+
+packages_of_suite() {
+    case $1 in
+        format) printf '%s\n' "${FORMAT_PACKAGES[@]}" ;;
+        shell) printf '%s\n' "${SHELL_PACKAGES[@]}" ;;
+        clang) printf '%s\n' "${CLANG_PACKAGES[@]}" ;;
+        lint) printf '%s\n' "${LINT_PACKAGES[@]}" ;;
+        unit | corpus | sweep | threads) printf '%s\n' "${TEST_PACKAGES[@]}" ;;
+        coverage) printf '%s\n' "${COVERAGE_PACKAGES[@]}" ;;
+        library) printf '%s\n' "${RELEASE_PACKAGES[@]}" ;;
+    esac
+}
+
+# count TESTS FAILED: what the suite leaves behind for the table.
+count() {
+    printf '%d %d\n' "$1" "$2" >"$RESULT"
+}
+
+# Runs one check for each file named on the input, on all cores; each is a test. check_files COMMAND...: the file comes
+# last.
+check_files() {
+    local output=$LOGS/$SUITE.files files failed
+    mapfile -t files
+    rm -rf -- "$output"
+    mkdir -p "$output"
+    # shellcheck disable=SC2016 # expanded by the inner shell
+    printf '%s\0' "${files[@]}" | xargs -0 -P "$(cores)" -I '{}' bash -c '
+        output=$1/${2//\//_}
+        file=$2
+        shift 2
+        "$@" "$file" >"$output" 2>&1 </dev/null || printf "%s\n" "$file" >>"$output.failed"
+    ' check "$output" '{}' "$@"
+    failed=$(find "$output" -name '*.failed' | wc -l)
+    say "  ${#files[@]} files, $failed failed"
+    find "$output" -name '*.failed' | sort | while IFS= read -r name; do
+        say "  failed: $(cat "$name")"
+        { printf '\n%s\n' "$(cat "$name")" && cat "${name%.failed}"; } >>"$LOG"
+        # One bad file in front of many others should not hide them.
+        head -n 30 "${name%.failed}" | sed 's/^/    | /'
+    done
+    count "${#files[@]}" "$failed"
+    ((${#files[@]} > 0 && failed == 0))
+}
+
+suite_format() {
+    cpp_files | check_files clang-format --dry-run -Werror
+}
+
+suite_shell() {
+    shell_scripts | check_files shellcheck -x
+}
+
+suite_clang() {
+    configure_clang || return 1
+    # A library that is up to date would prove nothing about warnings.
+    if step --title "\$ cmake --build build/clang --clean-first --target vorn_directory_domain" \
+        cmake --build build/clang --clean-first --parallel "$(cores)" --target vorn_directory_domain; then
+        count "$(grep -c '^\[.*Building CXX object' "$LOG")" 0
+    else
+        count 1 1
+        return 1
+    fi
+}
+
+suite_lint() {
+    configure_clang || return 1
+    cpp_files | grep '^src/.*\.cpp$' | check_files clang-tidy -p build/clang --quiet
+}
+
+# Everything that has a suite of its own is left out here, so that nothing is counted twice.
+suite_unit() {
+    configure asan-ubsan && build asan-ubsan || return 1
+    run_ctest_and_count build/asan-ubsan --label-exclude '^(sweep|corpus)$'
+}
+
+suite_corpus() {
+    configure asan-ubsan && build asan-ubsan || return 1
+    run_ctest_and_count build/asan-ubsan --label-regex '^corpus$'
+}
+
+suite_sweep() {
+    configure asan-ubsan && build asan-ubsan || return 1
+    TEST_TIMEOUT=2000 run_ctest_and_count build/asan-ubsan --label-regex '^sweep$' || return 1
+    sweep_totals "$LOGS/sweep.xml"
+}
+
+# The sum of what the operations' sweeps say of themselves.
+sweep_totals() {
+    grep -aEo 'scenarios [0-9]+, calls [0-9]+, runs [0-9]+, edges [0-9]+ of [0-9]+' "$1" | tr -d , | awk '
+        { scenarios += $2; calls += $4; runs += $6; reached += $8; edges += $10 }
+        END {
+            if (runs == 0) { print "  the tests did not tell what they swept"; exit 1 }
+            printf "  scenarios %d, calls %d, runs %d, edges %d of %d\n", scenarios, calls, runs, reached, edges
+        }'
+}
+
+suite_threads() {
+    # The other tests have one thread each, so building them would only cost time.
+    configure tsan && build tsan thread_tests || return 1
+    run_ctest_and_count build/tsan --label-regex '^threads$'
+}
+
+run_ctest_and_count() {
+    local result=0
+    run_ctest "$1" "$SUITE" "${@:2}" || result=$?
+    count "$TESTS" "$FAILED"
+    return "$result"
+}
+
+# The tests are the same as in "unit", so only the two figures count, and the tests when they fail here.
+suite_coverage() {
+    local report=build/coverage/report
+    configure coverage && build coverage || return 1
+    # Sources that are gone left objects behind, which would count as never reached.
+    ninja -C build/coverage -t cleandead >>"$LOG"
+    find build/coverage -name '*.gcno' -exec sh -c '[ -f "${1%.gcno}.o" ] || rm -f -- "$1"' drop {} \;
+    # Counters of an earlier run would add to those of this one.
+    find build/coverage -name '*.gcda' -delete
+    if ! run_ctest build/coverage coverage --label-exclude '^(sweep|corpus|threads)$'; then
+        count "$TESTS" "$((FAILED > 0 ? FAILED : 1))"
+        return 1
+    fi
+    rm -rf -- "$report"
+    mkdir -p "$report"
+    step --title "\$ gcovr (HTML in $report/index.html)" gcovr --root . --filter 'src/' --exclude-throw-branches \
+        --object-directory build/coverage -j "$(cores)" --html-details "$report/index.html" \
+        --json-summary "$report/summary.json" --txt "$report/summary.txt" build/coverage ||
+        return 1
+    judge_coverage "$report"
+}
+
+# number_in KEY FILE: the total of a summary, which comes after the figures of the single files.
+number_in() {
+    sed -n "s/^ *\"$1\": \([0-9]*\),*\$/\1/p" "$2" | tail -n 1
+}
+
+judge_coverage() {
+    local what covered total failed=0
+    for what in line branch; do
+        covered=$(number_in "${what}_covered" "$1/summary.json")
+        total=$(number_in "${what}_total" "$1/summary.json")
+        say "  ${covered:-none} of ${total:-unknown} ${what/%ch/che}s reached"
+        [[ -n $covered && $covered == "$total" && $total != 0 ]] || failed=$((failed + 1))
+    done
+    if ((failed > 0)); then
+        say "  where some were not (file, how many, how many reached, lines):"
+        grep -E '^src/' "$1/summary.txt" | grep -v ' 100%' | sed 's/^/    | /' || true
+    fi
+    count 2 "$failed"
+    ((failed == 0))
+}
+
+suite_library() {
+    configure release && build release || return 1
+    run_ctest_and_count build/release/tests/library --label-regex '^library$'
+}
