@@ -153,14 +153,14 @@ suite_coverage() {
     mkdir -p "$report"
     step --title "\$ gcovr (HTML in $report/index.html)" gcovr --root . --filter 'src/' --exclude-throw-branches \
         --object-directory build/coverage -j "$(cores)" --html-details "$report/index.html" \
-        --json-summary "$report/summary.json" --txt "$report/summary.txt" build/coverage ||
+        --json "$report/coverage.json" --json-summary "$report/summary.json" --json-summary-pretty build/coverage ||
         return 1
     judge_coverage "$report"
 }
 
-# number_in KEY FILE: the total of a summary, which comes after the figures of the single files.
+# number_in KEY FILE: of the whole project; the figures of the single files are indented further.
 number_in() {
-    sed -n "s/^ *\"$1\": \([0-9]*\),*\$/\1/p" "$2" | tail -n 1
+    sed -n "s/^    \"$1\": \([0-9]*\),*\$/\1/p" "$2"
 }
 
 judge_coverage() {
@@ -172,11 +172,18 @@ judge_coverage() {
         [[ -n $covered && $covered == "$total" && $total != 0 ]] || failed=$((failed + 1))
     done
     if ((failed > 0)); then
-        say "  where some were not (file, how many, how many reached, lines):"
-        grep -E '^src/' "$1/summary.txt" | grep -v ' 100%' | sed 's/^/    | /' || true
+        show_gaps "$1/coverage.json" Lines
+        show_gaps "$1/coverage.json" Branches --branches
     fi
     count 2 "$failed"
     ((failed == 0))
+}
+
+# show_gaps COVERAGE WHAT [OPTION]: the files with gaps, and the lines of the gaps.
+show_gaps() {
+    say "  $2 that were not reached (file, how many there are, how many were reached, lines):"
+    gcovr --root . --filter 'src/' --exclude-throw-branches --add-tracefile "$1" "${@:3}" 2>>"$LOG" |
+        awk '/^src\// { gap = !/ 100% *$/ } /^(-|TOTAL)/ { gap = 0 } gap' | sed 's/^/    | /'
 }
 
 suite_library() {

@@ -31,9 +31,7 @@ std::string SmbConfText(const char* key) {
 template <std::size_t Size>
 void FillField(char (&field)[Size], const Json::Value& options, const char* key) {
     std::memset(field, 0, Size);
-    if (options.isMember(key)) {
-        std::strncpy(field, options[key].asString().c_str(), Size - 1);
-    }
+    std::strncpy(field, options[key].asString().c_str(), Size - 1);
 }
 
 // False when no temporary name was to be had. What becomes of the writing and the rename is not looked at.

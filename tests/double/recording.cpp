@@ -128,7 +128,7 @@ void Recording::Fill(char* buffer, int size, const std::string& text) {
 }
 
 void Recording::Spoil(char* buffer, int size) {
-    Fill(buffer, size, "stale-garbage");
+    Fill(buffer, size, TheAppliance().state.staleText);
 }
 
 bool Recording::BadBuffer(const char* buffer, int size) {

@@ -64,7 +64,9 @@ int VORNSchedTaskListGet(_tag_vorn_sched_task_** list, VORNSchedTaskFilter filte
         return call.Failure(-1);
     }
     // The filter has to bear null, so it gets one each time.
-    filter(nullptr);
+    if (filter(nullptr) != 0) {
+        call.Misuse("a filter that takes null for one of its tasks");
+    }
     const std::vector<ScheduledTask> tasks = TheAppliance().state.scheduledTasks;
     for (const ScheduledTask& task : tasks) {
         auto record = std::make_unique<_tag_vorn_sched_task_>();

@@ -140,6 +140,9 @@ struct State {
     Json::Value startedParameters;
     std::vector<std::pair<std::string, bool>> stoppedTasks;  // id and force
 
+    // What a failing read leaves in its buffer, whose content nobody may look at.
+    std::string staleText = "stale-garbage";
+
     // Whether an operation that may replace a list or hash does so each time, so that a stale pointer is found.
     bool sectionLoaderReplacesHash = true;
     bool listGrowthReplacesList = true;

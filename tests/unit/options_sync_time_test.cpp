@@ -148,4 +148,13 @@ TEST_F(SyncTime, CountsAsUnwantedWhenTheRequestHasNone) {
     EXPECT_THAT(Stored(), ElementsAre(Pair("workgroup", "LAB"), Pair("vorn sync dctime", "no")));
 }
 
+TEST_F(SyncTime, IsNotReadFromWhatAFailedReadLeft) {
+    for (const int result : {0, -1}) {
+        Restart();
+        state.staleText = "yes";
+        appliance.FailNth("VLIBCFileGetKeyValue", 1, Fault::Result(result));
+        EXPECT_FALSE(Call(DomainGetOption).data["enable_sync_time"].asBool()) << result;
+    }
+}
+
 }  // namespace
