@@ -12,7 +12,7 @@ about_suite() {
         lint) say "clang-tidy finds nothing in src/" ;;
         unit) say "unit tests, with address and undefined-behaviour sanitizers" ;;
         corpus) say "the fuzzers' inputs as ordinary tests, with the same sanitizers" ;;
-        sweep) say "every call of the appliance fails once in every scenario, with the same sanitizers" ;;
+        sweep) say "every call of the appliance fails in every way, alone and in pairs, with the same sanitizers" ;;
         threads) say "requests on several threads, with the thread sanitizer" ;;
         coverage) say "the unit tests reach every line and every branch of src/" ;;
         library) say "the built library: symbols, linking, loading, all operations in a host" ;;
@@ -139,13 +139,13 @@ run_ctest_and_count() {
 # The tests are the same as in "unit", so only the two figures count, and the tests when they fail here.
 suite_coverage() {
     local report=build/coverage/report
-    configure coverage && build coverage || return 1
+    configure coverage && build coverage unit_tests thread_tests || return 1
     # Sources that are gone left objects behind, which would count as never reached.
     ninja -C build/coverage -t cleandead >>"$LOG"
     find build/coverage -name '*.gcno' -exec sh -c '[ -f "${1%.gcno}.o" ] || rm -f -- "$1"' drop {} \;
     # Counters of an earlier run would add to those of this one.
     find build/coverage -name '*.gcda' -delete
-    if ! run_ctest build/coverage coverage --label-exclude '^(sweep|corpus|threads)$'; then
+    if ! run_ctest build/coverage/tests/unit coverage --label-exclude '^threads$'; then
         count "$TESTS" "$((FAILED > 0 ? FAILED : 1))"
         return 1
     fi
