@@ -136,6 +136,9 @@ bool APIPolling::List(const std::string& prefix, const Json::Value& groups, Json
     Recording call("VORN::APIPolling::List", {Quoted(prefix), Compact(groups), "tasks"});
     const State& state = TheAppliance().state;
     if (call.Fails() || !AreNames(groups)) {
+        // Nobody may look at what a failed call leaves: here an unfinished task.
+        tasks = Json::Value(Json::objectValue);
+        tasks["stale"].append("stale-task");
         return impl->Fail(call);
     }
     if (state.taskList) {

@@ -58,6 +58,11 @@ def report(verdicts, reviewed, build):
     stale = [key for key in reviewed if key not in keys]
 
     table(verdicts)
+    slow = [mutant for mutant, verdict in made.items() if verdict == TIMED_OUT]
+    if slow:
+        print("\nTimed out, which counts as killed:\n")
+    for mutant in slow:
+        print(f"{mutant.place}: [{mutant.original}] -> [{mutant.mutated}]")
     if fresh:
         print("\nSurvivors that nobody has reviewed:\n")
     for mutant in fresh:

@@ -63,6 +63,16 @@ TYPED_TEST(HandlerRules, AHandlerKeepsItsRequestAndResponseAndBeginsWithoutAnErr
     EXPECT_THAT(this->appliance.Calls(), IsEmpty());
 }
 
+TYPED_TEST(HandlerRules, TheFirstErrorWinsWhateverItsNumber) {
+    fake::Exchange exchange;
+    for (const int first : {117, 2599, 2601, -1}) {
+        TypeParam handler(&exchange.request, &exchange.response);
+        handler.SetError(first);
+        handler.SetError(2617);
+        EXPECT_EQ(handler.error, first);
+    }
+}
+
 TYPED_TEST(HandlerRules, TheFirstErrorWins) {
     fake::Exchange exchange;
     TypeParam handler(&exchange.request, &exchange.response);

@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <sstream>
 
+#include "tests/unit/log_lines.h"
+
 namespace unit {
 
 using ::testing::AllOf;
@@ -32,6 +34,9 @@ ModuleTest::ModuleTest() : appliance(fake::TheAppliance()), state(appliance.stat
 void ModuleTest::TearDown() {
     EXPECT_EQ(appliance.LiveHandles(), 0) << appliance.LiveHandleNames();
     EXPECT_THAT(appliance.Misuses(), IsEmpty());
+    for (const fake::LogLine& line : appliance.Logs()) {
+        EXPECT_EQ(AstrayFrom(line), "");
+    }
 }
 
 void ModuleTest::Restart() {

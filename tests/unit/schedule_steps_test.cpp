@@ -86,6 +86,16 @@ TEST_F(ScheduleSteps, SaveRewritesTheTaskOfTheIdZeroWhateverWasRecordedBefore) {
     EXPECT_EQ(appliance.CountOf("VORNSchedTaskSave"), 1);
 }
 
+TEST_F(ScheduleSteps, SaveMakesNoSecondTaskWhateverWasRecordedBefore) {
+    for (const int earlier : {117, 2600, 2624}) {
+        Restart();
+        appliance.FailNth("VORNSchedTaskListGet", 1, Fault::Result(-1));
+        EXPECT_EQ(Save(Value(0), earlier), -1) << earlier;
+        EXPECT_EQ(appliance.CountOf("VORNSchedTaskLoad"), 0) << earlier;
+        EXPECT_EQ(appliance.CountOf("VORNSchedTaskSave"), 0) << earlier;
+    }
+}
+
 TEST_F(ScheduleSteps, SaveKeepsAnEarlierError) {
     appliance.FailNth("VORNSchedTaskAlloc", 1, Fault::Null());
     EXPECT_EQ(Save(Value(0), 2618), -1);

@@ -129,6 +129,13 @@ TEST_F(ScheduledRefresh, IsNotATaskWhoseCommandCannotBeRead) {
                             "VORNSchedTaskGetID(task)", "VORNSchedTaskListFree(list)"));
 }
 
+TEST_F(ScheduledRefresh, IsNotTakenFromWhatAFailedReadLeft) {
+    AddTask(5);
+    state.staleText = "/usr/vorn/sbin/vornwin -updateDomain";
+    appliance.FailNth("VORNSchedCTaskGetCommand", 1, Fault::Result(-1));
+    EXPECT_EQ(FindId(), -1);
+}
+
 TEST_F(ScheduledRefresh, IsFoundForAPositiveResultOfTheReading) {
     AddTask(5);
     appliance.FailNth("VORNSchedCTaskGetCommand", 1, Fault::Result(1));

@@ -66,6 +66,16 @@ TEST(ShellName, FindsABadByteBehindGoodOnes) {
     EXPECT_TRUE(IsHarmlessToShell(std::string(5000, 'a').c_str()));
 }
 
+TEST(ShellName, FindsABadByteBehindOneOf0x80AndAbove) {
+    EXPECT_TRUE(
+        IsHarmlessToShell("l\xC3\xA4"
+                          "b.test"));
+    EXPECT_FALSE(
+        IsHarmlessToShell("l\xC3\xA4"
+                          "b.test;x"));
+    EXPECT_FALSE(IsHarmlessToShell("\xFF x"));
+}
+
 TEST(ShellName, TakesAnEmptyName) {
     EXPECT_TRUE(IsHarmlessToShell(""));
 }
