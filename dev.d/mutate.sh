@@ -30,5 +30,5 @@ main() {
     need_packages "${MUTATE_PACKAGES[@]}"
     "$RUNNER" "$@" || result=$?
     ((result == 0)) || die "the tests do not notice every change, or the run broke off (code $result); see above"
-    say "ok: the tests notice every change that was tried"
+    say "ok: the mutation run has no complaint"
 }

@@ -8,6 +8,10 @@
 
 #include "src/domain_schedule.h"
 
+#include <algorithm>
+#include <cstring>
+#include <initializer_list>
+
 #include "platform/domain.h"
 #include "src/support/log.h"
 
@@ -34,15 +38,15 @@ void DomainScheduleHandler::ShowJson(const char* title, const Json::Value& value
 }
 
 bool DomainScheduleHandler::CHECK_PARAM_STRING(std::string name, bool required) {
-    return handler_rules::CheckParam(*request, name, required, &Json::Value::isString, kScheduleUnit, error);
+    return handler_rules::CheckParam(*request, name, required, handler_rules::IsString, kScheduleUnit, error);
 }
 
 bool DomainScheduleHandler::CHECK_PARAM_INT(std::string name, bool required) {
-    return handler_rules::CheckParam(*request, name, required, &Json::Value::isInt, kScheduleUnit, error);
+    return handler_rules::CheckParam(*request, name, required, handler_rules::IsInt, kScheduleUnit, error);
 }
 
 bool DomainScheduleHandler::CHECK_PARAM_BOOL(std::string name, bool required) {
-    return handler_rules::CheckParam(*request, name, required, &Json::Value::isBool, kScheduleUnit, error);
+    return handler_rules::CheckParam(*request, name, required, handler_rules::IsBool, kScheduleUnit, error);
 }
 
 void DomainScheduleHandler::Get() {
@@ -64,8 +68,12 @@ bool DomainScheduleHandler::CheckScheduleParam() {
     if (!CHECK_PARAM_INT("date_type", true)) {
         return false;
     }
+    const auto areInts = [this](std::initializer_list<const char*> names, bool required) {
+        return std::all_of(names.begin(), names.end(),
+                           [this, required](const char* name) { return CHECK_PARAM_INT(name, required); });
+    };
     const int dateType = request->GetParam("date_type", Json::Value()).asInt();
-    if (dateType != kNoSchedule && !(CHECK_PARAM_INT("hour", true) && CHECK_PARAM_INT("min", true))) {
+    if (dateType != kNoSchedule && !areInts({"hour", "min"}, true)) {
         return false;
     }
     switch (dateType) {
@@ -75,7 +83,10 @@ bool DomainScheduleHandler::CheckScheduleParam() {
             }
             break;
         case kFromDate:
-            if (!CHECK_PARAM_STRING("date", true) || !CHECK_PARAM_INT("repeat", true)) {
+            if (!CHECK_PARAM_STRING("date", true)) {
+                return false;
+            }
+            if (!CHECK_PARAM_INT("repeat", true)) {
                 return false;
             }
             break;
@@ -87,7 +98,7 @@ bool DomainScheduleHandler::CheckScheduleParam() {
             SetError(kBadParameter);
             return false;
     }
-    return CHECK_PARAM_INT("repeat_hour", false) && CHECK_PARAM_INT("last_work_hour", false);
+    return areInts({"repeat_hour", "last_work_hour"}, false);
 }
 
 bool DomainScheduleHandler::ComposeScheduleValue(Json::Value& out) {
@@ -95,8 +106,11 @@ bool DomainScheduleHandler::ComposeScheduleValue(Json::Value& out) {
     for (const char* key :
          {"date_type", "date", "hour", "last_work_hour", "min", "repeat", "repeat_hour", "week_name"}) {
         const Json::Value value = request->GetParam(key, Json::Value());
-        const bool isText = key == std::string("date") || key == std::string("week_name");
-        schedule[key] = isText ? Json::Value(value.asString()) : Json::Value(value.asInt());
+        if (std::strcmp(key, "date") == 0 || std::strcmp(key, "week_name") == 0) {
+            schedule[key] = value.asString();
+        } else {
+            schedule[key] = value.asInt();
+        }
     }
     out["schedule"] = schedule;
     return true;

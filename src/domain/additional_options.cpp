@@ -93,14 +93,19 @@ bool DomainServiceHandler::LoadDomainAdditionalData(Json::Value& data) {
 
 bool DomainServiceHandler::CheckAdditionalParam() {
     // Not the order in which they are saved: a client that sends several wrong ones hears of the first of these.
-    return CHECK_PARAM_BOOL("enable_sync_time", false) && CHECK_PARAM_BOOL("enable_server_signing", false) &&
-           CHECK_PARAM_BOOL("enable_rpc_enum_usergroup", false) && CHECK_PARAM_BOOL("disable_domain_admins", false) &&
-           CHECK_PARAM_INT("domain_nested_group", false);
+    for (const char* name :
+         {"enable_sync_time", "enable_server_signing", "enable_rpc_enum_usergroup", "disable_domain_admins"}) {
+        if (!CHECK_PARAM_BOOL(name, false)) {
+            return false;
+        }
+    }
+    return CHECK_PARAM_INT("domain_nested_group", false);
 }
 
 bool DomainServiceHandler::SaveAdditionalDomain() {
+    const auto given = [this](const char* name) { return request->HasParam(name); };
     bool changed = false;
-    if (request->HasParam("enable_sync_time") && !SaveSyncDCTime(changed)) {
+    if (given("enable_sync_time") && !SaveSyncDCTime(changed)) {
         return false;
     }
     StringHash hash;
@@ -111,23 +116,18 @@ bool DomainServiceHandler::SaveAdditionalDomain() {
     }
     LoadSmbInfo(hash);
 
-    using Update = bool (DomainServiceHandler::*)(VLIBSZHASH**, const char*, const char*);
-    struct Option {
-        const char* jsonKey;
-        const char* confKey;
-        Update update;
-    };
-    const Option options[] = {
-        {"enable_server_signing", kSigningKey, &DomainServiceHandler::UpdateBoolConf},
-        {"enable_rpc_enum_usergroup", kEnumKey, &DomainServiceHandler::UpdateBoolConf},
-        {"domain_nested_group", kNestedGroupsKey, &DomainServiceHandler::UpdateIntConf},
-        {"disable_domain_admins", kDisableAdminsKey, &DomainServiceHandler::UpdateDisableAdminConf},
-    };
-    for (const Option& option : options) {
-        if (request->HasParam(option.jsonKey) &&
-            (this->*option.update)(hash.address(), option.jsonKey, option.confKey)) {
-            changed = true;
-        }
+    if (given("enable_server_signing") && UpdateBoolConf(hash.address(), "enable_server_signing", kSigningKey)) {
+        changed = true;
+    }
+    if (given("enable_rpc_enum_usergroup") && UpdateBoolConf(hash.address(), "enable_rpc_enum_usergroup", kEnumKey)) {
+        changed = true;
+    }
+    if (given("domain_nested_group") && UpdateIntConf(hash.address(), "domain_nested_group", kNestedGroupsKey)) {
+        changed = true;
+    }
+    if (given("disable_domain_admins") &&
+        UpdateDisableAdminConf(hash.address(), "disable_domain_admins", kDisableAdminsKey)) {
+        changed = true;
     }
     if (!changed) {
         return true;

@@ -67,8 +67,11 @@ bool DomainServiceHandler::LoadDomainAdvData(Json::Value& data) {
     data["enable_advance_option"] = IsYes(hash.get(), kSwitchKey);
     data["kdc"] = SmbConfText("password server");
     data["netbios_name"] = SmbConfText("workgroup");
-    const std::string realm = SmbConfText("realm");
-    data["fqdn_name"] = realm == "*" ? "" : realm;
+    std::string realm = SmbConfText("realm");
+    if (realm == "*") {
+        realm.clear();
+    }
+    data["fqdn_name"] = realm;
     convertNICtoJsonArray(VLIBCSzHashGetValue(hash.get(), kNicsKey), data["register_nics"]);
     return true;
 }

@@ -19,29 +19,29 @@ void DomainServiceHandler::ShowJson(const char* title, const Json::Value& value)
 }
 
 bool DomainServiceHandler::CHECK_PARAM_STRING(std::string name, bool required) {
-    return handler_rules::CheckParam(*request, name, required, &Json::Value::isString, kDomainUnit, error);
+    return handler_rules::CheckParam(*request, name, required, handler_rules::IsString, kDomainUnit, error);
 }
 
 bool DomainServiceHandler::CHECK_PARAM_INT(std::string name, bool required) {
-    return handler_rules::CheckParam(*request, name, required, &Json::Value::isInt, kDomainUnit, error);
+    return handler_rules::CheckParam(*request, name, required, handler_rules::IsInt, kDomainUnit, error);
 }
 
 bool DomainServiceHandler::CHECK_PARAM_BOOL(std::string name, bool required) {
-    return handler_rules::CheckParam(*request, name, required, &Json::Value::isBool, kDomainUnit, error);
+    return handler_rules::CheckParam(*request, name, required, handler_rules::IsBool, kDomainUnit, error);
 }
 
 bool DomainServiceHandler::CHECK_JSON_STRING(const Json::Value& object, std::string key, bool required) {
-    return handler_rules::CheckMember(object, key, required, &Json::Value::isString, kDomainUnit, error);
+    return handler_rules::CheckMember(object, key, required, handler_rules::IsString, kDomainUnit, error);
 }
 
 bool DomainServiceHandler::CHECK_JSON_INT(const Json::Value& object, std::string key, bool required) {
-    return handler_rules::CheckMember(object, key, required, &Json::Value::isInt, kDomainUnit, error);
+    return handler_rules::CheckMember(object, key, required, handler_rules::IsInt, kDomainUnit, error);
 }
 
 bool DomainServiceHandler::CHECK_JSON_BOOL(const Json::Value& object, std::string key, bool required) {
-    return handler_rules::CheckMember(object, key, required, &Json::Value::isBool, kDomainUnit, error);
+    return handler_rules::CheckMember(object, key, required, handler_rules::IsBool, kDomainUnit, error);
 }
 
 bool DomainServiceHandler::CHECK_JSON_JSONARRAY(const Json::Value& object, std::string key, bool required) {
-    return handler_rules::CheckMember(object, key, required, &Json::Value::isArray, kDomainUnit, error);
+    return handler_rules::CheckMember(object, key, required, handler_rules::IsArray, kDomainUnit, error);
 }

@@ -25,6 +25,11 @@ void RemoveJoinStatus() {
     }
 }
 
+bool IsSameDns(const std::vector<std::string>& wanted, const std::vector<std::string>& current) {
+    const std::string wantedText = WebUtils::StringImplode(wanted, ",");
+    return wantedText == WebUtils::StringImplode(current, ",");
+}
+
 }  // namespace
 
 // What is known of a join while it runs.
@@ -86,8 +91,7 @@ bool DomainServiceHandler::TryJoin(JoinAttempt& attempt) {
         attempt.newDns = WebUtils::StringExplode(request->GetParam("dns", "").asString(), ",");
     }
     // Servers that can't be set are recorded but stop nothing: the join may work with the old ones.
-    if (!attempt.newDns.empty() &&
-        WebUtils::StringImplode(attempt.newDns, ",") != WebUtils::StringImplode(attempt.oldDns, ",")) {
+    if (!attempt.newDns.empty() && !IsSameDns(attempt.newDns, attempt.oldDns)) {
         attempt.dnsChanged = SetDNSList(attempt.newDns);
     }
 

@@ -40,13 +40,11 @@ constexpr JoinStatusRow kJoinStatusRows[] = {
 };
 
 bool Matches(const JoinStatusRow& row, const char* message) {
-    switch (row.match) {
-        case Match::kEquals:
-            return std::strcmp(message, row.text) == 0;
-        case Match::kContains:
-            return std::strstr(message, row.text) != nullptr;
-        case Match::kBeginsWith:
-            break;
+    if (row.match == Match::kEquals) {
+        return std::strcmp(message, row.text) == 0;
+    }
+    if (row.match == Match::kContains) {
+        return std::strstr(message, row.text) != nullptr;
     }
     return std::strncmp(message, row.text, std::strlen(row.text)) == 0;
 }

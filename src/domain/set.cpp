@@ -39,8 +39,12 @@ bool DomainServiceHandler::CheckBaseParam() {
         SetError(2601);
         return false;
     }
-    return CHECK_PARAM_STRING("username", true) && CHECK_PARAM_STRING("password", true) &&
-           CHECK_PARAM_STRING("dns", false);
+    for (const char* name : {"username", "password"}) {
+        if (!CHECK_PARAM_STRING(name, true)) {
+            return false;
+        }
+    }
+    return CHECK_PARAM_STRING("dns", false);
 }
 
 bool DomainServiceHandler::CheckAdvanceParam() {
@@ -48,7 +52,13 @@ bool DomainServiceHandler::CheckAdvanceParam() {
         return true;
     }
     const Json::Value options = request->GetParam("advance_domain_conf", Json::Value());
-    return CHECK_JSON_BOOL(options, "enable_advance_option", true) && CHECK_JSON_STRING(options, "kdc", false) &&
-           CHECK_JSON_STRING(options, "netbios_name", false) && CHECK_JSON_STRING(options, "fqdn_name", false) &&
-           CHECK_JSON_JSONARRAY(options, "register_nics", false);
+    if (!CHECK_JSON_BOOL(options, "enable_advance_option", true)) {
+        return false;
+    }
+    for (const char* key : {"kdc", "netbios_name", "fqdn_name"}) {
+        if (!CHECK_JSON_STRING(options, key, false)) {
+            return false;
+        }
+    }
+    return CHECK_JSON_JSONARRAY(options, "register_nics", false);
 }

@@ -9,15 +9,15 @@ namespace handler_rules {
 
 namespace {
 
-// The end that every check has in common; `value` is looked at only when it is there.
-bool Judge(const std::string& name, bool present, bool required, bool rightType, const char* unit,
+// What every check comes to; `value` is null when there is none.
+bool Judge(const std::string& name, const Json::Value* value, bool required, TypeTest isType, const char* unit,
            std::int32_t& error) {
-    if (!present && required) {
+    if (value == nullptr && required) {
         syslog(LOG_ERR, "%s:%d cannot get the paramter: %s", unit, LOG_NUMBER(kHandlerRules), name.c_str());
         RecordError(error, kBadParameter);
         return false;
     }
-    if (present && !rightType) {
+    if (value != nullptr && !isType(*value)) {
         syslog(LOG_ERR, "%s:%d wrong the paramter: %s", unit, LOG_NUMBER(kHandlerRules), name.c_str());
         RecordError(error, kBadParameter);
         return false;
@@ -35,16 +35,17 @@ void RecordError(std::int32_t& error, std::int32_t code) {
 
 bool CheckParam(const VORN::APIRequest& request, const std::string& name, bool required, TypeTest isType,
                 const char* unit, std::int32_t& error) {
-    const bool present = request.HasParam(name);
-    const bool rightType = present && (request.GetParam(name, Json::Value()).*isType)();
-    return Judge(name, present, required, rightType, unit, error);
+    if (!request.HasParam(name)) {
+        return Judge(name, nullptr, required, isType, unit, error);
+    }
+    const Json::Value value = request.GetParam(name, Json::Value());
+    return Judge(name, &value, required, isType, unit, error);
 }
 
 bool CheckMember(const Json::Value& object, const std::string& key, bool required, TypeTest isType, const char* unit,
                  std::int32_t& error) {
-    const bool present = HasMember(object, key);
-    const bool rightType = present && (object[key].*isType)();
-    return Judge(key, present, required, rightType, unit, error);
+    const Json::Value* value = HasMember(object, key) ? &object[key] : nullptr;
+    return Judge(key, value, required, isType, unit, error);
 }
 
 void ShowJson(const char* title, const Json::Value& value, const char* unit) {

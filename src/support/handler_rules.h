@@ -18,8 +18,21 @@ constexpr int kPollingError = 117;            // the background-task framework c
 
 namespace handler_rules {
 
-// A test of a JSON value's type, such as &Json::Value::isString.
-using TypeTest = bool (Json::Value::*)() const;
+// A test of a JSON value's type.
+using TypeTest = bool (*)(const Json::Value& value);
+
+inline bool IsString(const Json::Value& value) {
+    return value.isString();
+}
+inline bool IsInt(const Json::Value& value) {
+    return value.isInt();
+}
+inline bool IsBool(const Json::Value& value) {
+    return value.isBool();
+}
+inline bool IsArray(const Json::Value& value) {
+    return value.isArray();
+}
 
 // Sets `error` to `code` unless a code was recorded before.
 void RecordError(std::int32_t& error, std::int32_t code);
