@@ -9,7 +9,6 @@
 #include "src/domain_schedule.h"
 
 #include <algorithm>
-#include <cstring>
 #include <initializer_list>
 
 #include "platform/domain.h"
@@ -19,6 +18,17 @@ namespace {
 
 constexpr int kOnWeekdays = 0;
 constexpr int kFromDate = 1;
+
+struct ScheduleKey {
+    const char* name;
+    bool isText;
+};
+
+// In the order in which they are read.
+constexpr ScheduleKey kScheduleKeys[] = {
+    {"date_type", false}, {"date", true},    {"hour", false},        {"last_work_hour", false},
+    {"min", false},       {"repeat", false}, {"repeat_hour", false}, {"week_name", true},
+};
 
 }  // namespace
 
@@ -103,13 +113,12 @@ bool DomainScheduleHandler::CheckScheduleParam() {
 
 bool DomainScheduleHandler::ComposeScheduleValue(Json::Value& out) {
     Json::Value schedule;
-    for (const char* key :
-         {"date_type", "date", "hour", "last_work_hour", "min", "repeat", "repeat_hour", "week_name"}) {
-        const Json::Value value = request->GetParam(key, Json::Value());
-        if (std::strcmp(key, "date") == 0 || std::strcmp(key, "week_name") == 0) {
-            schedule[key] = value.asString();
+    for (const ScheduleKey& key : kScheduleKeys) {
+        const Json::Value value = request->GetParam(key.name, Json::Value());
+        if (key.isText) {
+            schedule[key.name] = value.asString();
         } else {
-            schedule[key] = value.asInt();
+            schedule[key.name] = value.asInt();
         }
     }
     out["schedule"] = schedule;
