@@ -1,8 +1,14 @@
 # The Debian packages that each kind of work needs.
 # shellcheck shell=bash disable=SC2034 # used by the files that read this one
 
-BUILD_PACKAGES=(g++ cmake ninja-build libjsoncpp-dev)
+MODULE_PACKAGES=(g++ cmake ninja-build libjsoncpp-dev)
+# What the Debian machine's side needs beyond the module.
+APPLIANCE_PACKAGES=(pkg-config libboost1.81-dev libcli11-dev libkrb5-dev libldap-dev libsqlite3-dev libtdb-dev
+    libwbclient-dev)
+BUILD_PACKAGES=("${MODULE_PACKAGES[@]}" "${APPLIANCE_PACKAGES[@]}")
 TEST_PACKAGES=("${BUILD_PACKAGES[@]}" libgtest-dev libgmock-dev)
+# The appliance without a domain is tested with Samba's own reader of configuration files beside it.
+PLATFORM_PACKAGES=("${TEST_PACKAGES[@]}" acl python3 samba samba-common-bin winbind)
 RELEASE_PACKAGES=("${TEST_PACKAGES[@]}" libbenchmark-dev binutils python3 valgrind)
 CLANG_PACKAGES=("${BUILD_PACKAGES[@]}" clang)
 LINT_PACKAGES=("${CLANG_PACKAGES[@]}" clang-tidy)
@@ -12,6 +18,10 @@ FORMAT_PACKAGES=(clang-format)
 COVERAGE_PACKAGES=("${TEST_PACKAGES[@]}" gcovr)
 SHELL_PACKAGES=(shellcheck)
 FRESH_PACKAGES=(debootstrap)
+LAB_PACKAGES=(samba winbind samba-dsdb-modules samba-vfs-modules samba-ad-provision smbclient ldb-tools krb5-user
+    libsasl2-modules-gssapi-mit bind9-dnsutils libnss-winbind nftables attr acl iproute2 procps busybox cron curl
+    python3 python3-samba)
+E2E_PACKAGES=("${LAB_PACKAGES[@]}" python3-pytest)
 
 packages_of_preset() {
     case $1 in
@@ -29,6 +39,22 @@ missing_packages() {
     done
 }
 
+POLICY=/usr/sbin/policy-rc.d
+POLICY_MARK="# made by ./dev while it installs packages"
+
+# Services that come with the packages are not to start on this machine: Debian's own switch for that, unless somebody
+# else has set it. One that a killed command left goes as well.
+forbid_services() {
+    ! grep -qsFx "$POLICY_MARK" "$POLICY" || rm -f -- "$POLICY"
+    [[ ! -e $POLICY ]] || return 0
+    { printf '#!/bin/sh\n%s\nexit 101\n' "$POLICY_MARK" >"$POLICY" && chmod 755 "$POLICY"; } ||
+        die "$POLICY can't be written"
+}
+
+allow_services() {
+    ! grep -qsFx "$POLICY_MARK" "$POLICY" || rm -f -- "$POLICY"
+}
+
 # Installs those of the packages that are missing. Without any, neither the network nor root is needed.
 need_packages() {
     local missing
@@ -44,6 +70,12 @@ need_packages() {
     local options=(-q -o DPkg::Lock::Timeout=300 -o Acquire::Retries=3)
     step apt-get "${options[@]}" update ||
         die "apt-get update failed. Check the network and the sources in /etc/apt, then try again"
-    step env DEBIAN_FRONTEND=noninteractive apt-get "${options[@]}" install -y --no-install-recommends "${missing[@]}" ||
-        die "apt-get could not install the packages. The reason is above"
+    local result=0
+    forbid_services
+    trap 'allow_services; interrupted' INT TERM
+    step env DEBIAN_FRONTEND=noninteractive apt-get "${options[@]}" install -y --no-install-recommends \
+        "${missing[@]}" || result=$?
+    trap interrupted INT TERM
+    allow_services
+    ((result == 0)) || die "apt-get could not install the packages. The reason is above"
 }

@@ -1,37 +1,119 @@
-# ./dev run: the built library at work.
-# shellcheck shell=bash
+# ./dev run: an appliance that joins a real domain, and all that it does then.
+# shellcheck shell=bash disable=SC2153 # ROOT is of the file that reads this one
 
-for file in packages cmake; do
+for file in packages cmake run_steps; do
     # shellcheck source=/dev/null
     . "$ROOT/dev.d/$file.sh"
 done
 
+LAB=$ROOT/lab/lab
+BUILD=$ROOT/build/appliance
+STAGE=$ROOT/build/stage
+TARGETS=(vorn_directory_domain vorn_platform appliance_directory_module vornd vornctl vornwin vornjoin)
+
 usage() {
     cat <<'TEXT'
-usage: ./dev run
+usage: ./dev run [--once | --unjoined]
 
-Builds the library that is shipped and a small host, loads the library as the appliance's server does, and calls all of
-its operations through its API table. Each request, its answer and the time it took are shown. The appliance around it
-is imitated: nothing outside the program is read, changed or run.
+Makes this machine into a storage appliance, without changing it: installs the packages that are missing, builds, brings
+up two domains of Active Directory that trust each other and an appliance beside them, and does the main job there, step
+by step: join, test, list, refresh, options, schedule. Each step is shown with its answer and the time it took. Then all
+of it stays up, with hints what to try, until Ctrl-C takes it down.
+
+  --once       leave the domain after the last step, take everything down and end
+  --unjoined   stop before the join, so that the rest can be done by hand
+
+Domains and appliance live in namespaces of their own: they see a private copy of this machine's files, and nothing that
+they write or send leaves them. Needs root, and the right to make namespaces (in a container: a privileged one).
 TEXT
 }
 
 main() {
-    case ${1:-} in
-        -h | --help)
-            usage
-            return
-            ;;
-        '') ;;
-        *) wrong_usage "\"run\" takes no \"$1\"." ;;
-    esac
+    local once=false unjoined=false
+    while (($# > 0)); do
+        case $1 in
+            -h | --help)
+                usage
+                return
+                ;;
+            --once) once=true ;;
+            --unjoined) unjoined=true ;;
+            *) wrong_usage "\"run\" takes no \"$1\"." ;;
+        esac
+        shift
+    done
+    check_rights
     start_log
-    need_packages "${RELEASE_PACKAGES[@]}"
-    configure release || die "CMake could not configure the release"
-    build release vorn_directory_domain library_host || die "the library and its host could not be built"
-    printf '\nThe appliance is IMITATED: no domain, no network and no file of this machine is touched.\n'
-    printf 'The library is the real one, as it is shipped.\n\n'
-    build/release/tests/library/library_host build/release/src/vorn_directory_domain.so ||
-        die "the library did not answer as expected; see above"
-    say "ok: the library works in a host with an imitated appliance"
+    ! "$LAB" status >/dev/null 2>&1 ||
+        die "a lab is up already; \"./dev lab down\" takes it down. LAB_DIR names another folder for a second one"
+    need_packages "${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}"
+    build_stage
+    trap end_run EXIT
+    trap interrupted INT TERM HUP
+    bring_up
+    show_unjoined
+    if $unjoined; then
+        $once || stay_up hints_to_join
+        return
+    fi
+    show_main_job
+    if $once; then
+        show_leave
+        "$LAB" down || die "the lab could not be taken down"
+        trap - EXIT
+        say "ok: joined, did the main job, and left"
+    else
+        stay_up hints
+    fi
+}
+
+# Said at once, and not after minutes of building.
+check_rights() {
+    ((EUID == 0)) || die "only root can make namespaces and install packages. Run this as root"
+    unshare --pid --fork --mount --net --uts --ipc --propagation unchanged true 2>/dev/null ||
+        die "this machine does not let root make namespaces. In a container: start it privileged (docker: --privileged)"
+}
+
+build_stage() {
+    printf '\nBuilding the appliance\n'
+    drop_foreign_build "$BUILD"
+    step cmake --preset release -B "${BUILD#"$ROOT"/}" -D VORN_BUILD_BENCH=OFF -D VORN_BUILD_LIBRARY_TESTS=OFF ||
+        die "CMake could not configure the appliance"
+    step --title "\$ cmake --build ${BUILD#"$ROOT"/}" \
+        cmake --build "$BUILD" --parallel "$(cores)" --target "${TARGETS[@]}" ||
+        die "the appliance could not be built"
+    rm -rf -- "$STAGE.new"
+    step --title "\$ cmake --install ${BUILD#"$ROOT"/} (into ${STAGE#"$ROOT"/})" \
+        env DESTDIR="$STAGE.new" cmake --install "$BUILD" --strip || die "the appliance could not be staged"
+    # Whole or not there, also when this is interrupted.
+    { rm -rf -- "$STAGE" && mv -- "$STAGE.new" "$STAGE"; } || die "${STAGE#"$ROOT"/} can't be replaced"
+}
+
+bring_up() {
+    printf '\nBringing up the domains and the appliance nas1\n'
+    "$LAB" up --only-new --with-pid $$ --trust --appliances nas1 --stage "$STAGE" | sed -u 's/^/  /' ||
+        die "the lab could not be brought up"
+    "$LAB" vornd nas1 start | sed -u 's/^/  /' || die "the appliance's server did not start"
+}
+
+# However this command ends, nothing stays up.
+end_run() {
+    local result=$?
+    trap - EXIT
+    trap '' INT TERM HUP
+    "$LAB" down || result=1
+    exit "$result"
+}
+
+# Until Ctrl-C, which is the right end then.
+stay_up() {
+    local result=0
+    "$1"
+    # shellcheck disable=SC2064 # now
+    trap "printf '\n'; exit 0" INT TERM HUP
+    while "$LAB" status >/dev/null 2>&1; do
+        sleep 1 &
+        wait "$!" || result=$?
+    done
+    die "the lab is gone: something else has taken it down"
 }

@@ -1,7 +1,7 @@
 # The suites of "./dev test". Each one runs as a process of its own (suite.sh) and leaves its counts with "count".
 # shellcheck shell=bash disable=SC2034,SC2153 # variables shared with the files that read this one
 
-SUITES=(format shell clang lint unit corpus sweep threads coverage library)
+SUITES=(format shell clang lint unit corpus sweep threads coverage library platform)
 QUICK_SUITES=(format shell unit corpus library)
 
 about_suite() {
@@ -16,6 +16,7 @@ about_suite() {
         threads) say "requests on several threads, with the thread sanitizer" ;;
         coverage) say "the unit tests reach every line and every branch of src/" ;;
         library) say "the built library: symbols, linking, loading, all operations in a host" ;;
+        platform) say "the appliance on Debian without a domain, with address and undefined-behaviour sanitizers" ;;
     esac
 }
 
@@ -34,6 +35,7 @@ packages_of_suite() {
         shell) printf '%s\n' "${SHELL_PACKAGES[@]}" ;;
         clang) printf '%s\n' "${CLANG_PACKAGES[@]}" ;;
         lint) printf '%s\n' "${LINT_PACKAGES[@]}" ;;
+        platform) printf '%s\n' "${PLATFORM_PACKAGES[@]}" ;;
         unit | corpus | sweep | threads) printf '%s\n' "${TEST_PACKAGES[@]}" ;;
         coverage) printf '%s\n' "${COVERAGE_PACKAGES[@]}" ;;
         library) printf '%s\n' "${RELEASE_PACKAGES[@]}" ;;
@@ -99,7 +101,12 @@ suite_lint() {
 # Everything that has a suite of its own is left out here, so that nothing is counted twice.
 suite_unit() {
     configure asan-ubsan && build asan-ubsan || return 1
-    run_ctest_and_count build/asan-ubsan --label-exclude '^(sweep|corpus)$'
+    run_ctest_and_count build/asan-ubsan --label-exclude '^(sweep|corpus|platform)$'
+}
+
+suite_platform() {
+    configure asan-ubsan && build asan-ubsan || return 1
+    run_ctest_and_count build/asan-ubsan --label-regex '^platform$'
 }
 
 suite_corpus() {

@@ -1,0 +1,18 @@
+// The appliance's own log lines: to syslog, and to the terminal where a program asks for it.
+
+#ifndef VORN_APPLIANCE_BASE_LOG_H
+#define VORN_APPLIANCE_BASE_LOG_H
+
+#include <syslog.h>
+
+#include <string>
+
+namespace appliance {
+
+// Writes one line at a priority of syslog (LOG_ERR, LOG_WARNING, LOG_NOTICE, LOG_INFO, LOG_DEBUG). Control bytes are
+// shown as \xNN, so that a line stays one line. Never a secret.
+void Log(int priority, const std::string& text);
+
+}  // namespace appliance
+
+#endif

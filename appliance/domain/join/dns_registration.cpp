@@ -1,0 +1,113 @@
+#include "appliance/domain/join/dns_registration.h"
+
+#include <arpa/inet.h>
+#include <ifaddrs.h>
+#include <net/if.h>
+#include <netinet/in.h>
+
+#include <algorithm>
+#include <array>
+#include <memory>
+
+#include "appliance/base/conf_file.h"
+#include "appliance/base/paths.h"
+#include "appliance/base/text.h"
+#include "appliance/domain/join/time_budget.h"
+#include "appliance/domain/join/tool_output.h"
+
+namespace appliance {
+
+namespace {
+
+constexpr std::size_t kMostAddresses = 32;
+
+std::vector<std::string> WantedInterfaces() {
+    ConfFile options;
+    std::vector<std::string> names;
+    if (ConfFile::Load(Path(kSmbInfo), options)) {
+        return names;
+    }
+    for (const std::string& name : Split(options.Get("global", "register nic").value_or(""), ",")) {
+        if (!Trim(name).empty()) {
+            names.push_back(Trim(name));
+        }
+    }
+    return names;
+}
+
+// The address as text; empty when it is none that other machines could use.
+std::string UsableAddress(const sockaddr& address) {
+    std::array<char, INET6_ADDRSTRLEN> text{};
+    if (address.sa_family == AF_INET) {
+        const auto* v4 = reinterpret_cast<const sockaddr_in*>(&address);
+        const std::uint32_t number = ntohl(v4->sin_addr.s_addr);
+        const bool linkLocal = (number >> 16) == 0xA9FE;
+        const bool loopback = (number >> 24) == 127;
+        if (linkLocal || loopback || inet_ntop(AF_INET, &v4->sin_addr, text.data(), text.size()) == nullptr) {
+            return "";
+        }
+    } else if (address.sa_family == AF_INET6) {
+        const auto* v6 = reinterpret_cast<const sockaddr_in6*>(&address);
+        if (IN6_IS_ADDR_LINKLOCAL(&v6->sin6_addr) || IN6_IS_ADDR_LOOPBACK(&v6->sin6_addr) ||
+            inet_ntop(AF_INET6, &v6->sin6_addr, text.data(), text.size()) == nullptr) {
+            return "";
+        }
+    }
+    return text.data();
+}
+
+}  // namespace
+
+std::vector<std::string> AddressesToRegister() {
+    const std::vector<std::string> wanted = WantedInterfaces();
+    std::vector<std::string> addresses;
+    ifaddrs* first = nullptr;
+    if (getifaddrs(&first) != 0) {
+        return addresses;
+    }
+    const std::unique_ptr<ifaddrs, void (*)(ifaddrs*)> owner(first, freeifaddrs);
+    for (const ifaddrs* place = first; place != nullptr; place = place->ifa_next) {
+        const bool named = wanted.empty() || std::find(wanted.begin(), wanted.end(), place->ifa_name) != wanted.end();
+        if (place->ifa_addr == nullptr || (place->ifa_flags & IFF_LOOPBACK) != 0 || (place->ifa_flags & IFF_UP) == 0 ||
+            !named) {
+            continue;
+        }
+        const std::string address = UsableAddress(*place->ifa_addr);
+        if (!address.empty() && addresses.size() < kMostAddresses &&
+            std::find(addresses.begin(), addresses.end(), address) == addresses.end()) {
+            addresses.push_back(address);
+        }
+    }
+    return addresses;
+}
+
+std::string RegisteredName(const Membership& membership) {
+    return Lower(membership.machine) + "." + Lower(membership.realm);
+}
+
+std::string RegisterInDns(const Membership& membership, const std::vector<std::string>& addresses,
+                          const Credentials& credentials, std::chrono::milliseconds time) {
+    const TimeBudget deadline(time);
+    SambaCall call;
+    call.arguments = {"ads", "dns", "register", "--machine-pass", "--", RegisteredName(membership)};
+    call.arguments.insert(call.arguments.end(), addresses.begin(), addresses.end());
+    call.deadline = deadline.Left(time);
+    CommandResult result = RunNet(call);
+    if (!result.Succeeded() && !credentials.user.empty() && !deadline.Over()) {
+        call.arguments.erase(call.arguments.begin() + 3);
+        call.credentials = &credentials;
+        call.deadline = deadline.Left(time);
+        result = RunNet(call);
+    }
+    return result.Succeeded() ? "" : LastWords(result);
+}
+
+std::string UnregisterInDns(const Membership& membership, std::chrono::milliseconds deadline) {
+    SambaCall call;
+    call.arguments = {"ads", "dns", "unregister", "--machine-pass", "--", RegisteredName(membership)};
+    call.deadline = deadline;
+    const CommandResult result = RunNet(call);
+    return result.Succeeded() ? "" : LastWords(result);
+}
+
+}  // namespace appliance

@@ -1,0 +1,88 @@
+#include "appliance/domain/join/winbind.h"
+
+#include <algorithm>
+#include <array>
+#include <thread>
+
+#include "appliance/base/file.h"
+#include "appliance/base/log.h"
+#include "appliance/base/paths.h"
+#include "appliance/domain/join/time_budget.h"
+#include "appliance/domain/join/tool_output.h"
+#include "appliance/domain/membership/samba.h"
+#include "appliance/platform/system/services.h"
+
+namespace appliance {
+
+namespace {
+
+using std::chrono::milliseconds;
+
+constexpr char kService[] = "winbindd";
+constexpr milliseconds kPause{20};
+constexpr milliseconds kLongPause{100};
+constexpr milliseconds kAttempt{3000};
+constexpr milliseconds kLeastAttempt{500};  // less time is not worth asking in
+
+constexpr std::array kCaches = {
+    "/var/cache/samba/winbindd_cache.tdb",    "/var/lib/samba/winbindd_cache.tdb",
+    "/var/cache/samba/netsamlogon_cache.tdb", "/var/lib/samba/netsamlogon_cache.tdb",
+    "/var/cache/samba/gencache.tdb",          "/run/samba/gencache.tdb",
+};
+
+bool Answers(milliseconds deadline) {
+    SambaCall call;
+    call.arguments = {"--ping"};
+    call.deadline = deadline;
+    return RunWbinfo(call).Succeeded();
+}
+
+}  // namespace
+
+std::string StopWinbind(milliseconds deadline) {
+    const ServiceResult result = StopService(kService, deadline);
+    return result ? "" : result.error;
+}
+
+std::string StartWinbind(milliseconds time) {
+    const TimeBudget budget(time);
+    const ServiceResult result = StartService(kService, time);
+    if (!result) {
+        return result.error;
+    }
+    while (!Answers(budget.Left(kAttempt))) {
+        if (budget.Over()) {
+            return "winbindd does not answer";
+        }
+        std::this_thread::sleep_for(kPause);
+    }
+    return "";
+}
+
+std::string ConfirmTrust(milliseconds time) {
+    const TimeBudget budget(time);
+    SambaCall call;
+    call.arguments = {"--check-secret"};
+    std::string words = "not asked";
+    while (budget.Left(time) >= kLeastAttempt) {
+        call.deadline = budget.Left(time);
+        const CommandResult result = RunWbinfo(call);
+        if (result.Succeeded()) {
+            return "";
+        }
+        words = LastWords(result);
+        std::this_thread::sleep_for(std::min(budget.Left(time), kLongPause));
+    }
+    return words;
+}
+
+void RemoveDomainCaches() {
+    for (const char* cache : kCaches) {
+        if (const std::error_code error = RemoveFile(Path(cache));
+            error && error != std::errc::no_such_file_or_directory) {
+            Log(LOG_WARNING, Path(cache) + ": " + error.message());
+        }
+    }
+}
+
+}  // namespace appliance

@@ -1,0 +1,253 @@
+#include "appliance/domain/membership/secrets.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <tdb.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <cstdlib>
+#include <cstring>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <system_error>
+#include <thread>
+
+#include "appliance/base/file.h"
+#include "appliance/base/text.h"
+
+namespace appliance {
+
+namespace {
+
+constexpr mode_t kMode = 0600;
+constexpr std::chrono::milliseconds kLockWait{3000};
+constexpr std::chrono::milliseconds kLockPause{10};
+
+std::mutex& OneAtATime() {
+    static std::mutex mutex;
+    return mutex;
+}
+
+struct CloseTdb {
+    void operator()(tdb_context* context) const {
+        tdb_close(context);
+    }
+};
+using Tdb = std::unique_ptr<tdb_context, CloseTdb>;
+
+// Bytes that are wiped when they go.
+class Bytes {
+public:
+    explicit Bytes(TDB_DATA data) : text_(reinterpret_cast<const char*>(data.dptr), data.dsize) {}
+    ~Bytes() {
+        explicit_bzero(text_.data(), text_.size());
+    }
+    Bytes(const Bytes&) = delete;
+    Bytes& operator=(const Bytes&) = delete;
+
+    TDB_DATA data() {
+        return {reinterpret_cast<unsigned char*>(text_.data()), text_.size()};
+    }
+
+private:
+    std::string text_;
+};
+using Records = std::map<std::string, std::unique_ptr<Bytes>>;
+
+TDB_DATA KeyOf(std::string& key) {
+    return {reinterpret_cast<unsigned char*>(key.data()), key.size()};
+}
+
+[[noreturn]] void Throw(const std::string& path, int error) {
+    throw std::system_error(error != 0 ? error : EIO, std::generic_category(), path);
+}
+
+Tdb Open(const std::string& path, int openFlags) {
+    // A database whose last writer was killed in a transaction is only put right by one who may write it.
+    return Tdb(tdb_open(path.c_str(), 0, TDB_DEFAULT, openFlags | O_CLOEXEC, kMode));
+}
+
+Tdb OpenForReading(const std::string& path) {
+    Tdb tdb = Open(path, O_RDONLY);
+    if (!tdb && errno != ENOENT) {
+        tdb = Open(path, O_RDWR);
+    }
+    return tdb;
+}
+
+std::string PasswordKey(const std::string& domain) {
+    return "SECRETS/MACHINE_PASSWORD/" + Upper(domain);
+}
+
+// Tries until it succeeds or the wait is over. What stands in the way is held by other programs for moments.
+template <typename Attempt>
+bool WithinWait(const Attempt& attempt) {
+    const auto end = std::chrono::steady_clock::now() + kLockWait;
+    while (!attempt()) {
+        if (std::chrono::steady_clock::now() >= end) {
+            return false;
+        }
+        std::this_thread::sleep_for(kLockPause);
+    }
+    return true;
+}
+
+int CollectRecord(tdb_context*, TDB_DATA key, TDB_DATA value, void* records) {
+    std::string name(reinterpret_cast<const char*>(key.dptr), key.dsize);
+    (*static_cast<Records*>(records))[name] = std::make_unique<Bytes>(value);
+    return 0;
+}
+
+Records ReadAll(const std::string& path) {
+    Records records;
+    Tdb tdb = Open(path, O_RDWR);
+    if (!tdb) {
+        if (errno == ENOENT) {
+            return records;
+        }
+        Throw(path, errno);
+    }
+    if (!WithinWait([&] { return tdb_lockall_read_nonblock(tdb.get()) == 0; })) {
+        Throw(path, EAGAIN);
+    }
+    const int count = tdb_traverse_read(tdb.get(), CollectRecord, &records);
+    tdb_unlockall_read(tdb.get());
+    if (count < 0) {
+        Throw(path, EIO);
+    }
+    return records;
+}
+
+bool EndsWith(std::string_view text, const std::string& ending) {
+    return text.size() >= ending.size() && text.substr(text.size() - ending.size()) == ending;
+}
+
+bool Owns(const SecretsOwner& owner, const std::string& recordKey) {
+    // Some programs store keys with their NUL.
+    const std::string key = Upper(std::string(recordKey.c_str()));
+    if (!owner.machine.empty() && key == "SECRETS/SID/" + Upper(owner.machine)) {
+        return false;
+    }
+    return (!owner.domain.empty() && EndsWith(key, "/" + Upper(owner.domain))) ||
+           (!owner.realm.empty() && EndsWith(key, "/" + Upper(owner.realm)));
+}
+
+bool OwnedByAny(const std::vector<SecretsOwner>& owners, const std::string& key) {
+    for (const SecretsOwner& owner : owners) {
+        if (Owns(owner, key)) {
+            return true;
+        }
+    }
+    return false;
+}
+
+std::optional<std::string> StoredPassword(const std::string& path, const std::string& domain) {
+    const Tdb tdb = OpenForReading(path);
+    if (!tdb) {
+        return std::nullopt;
+    }
+    std::string key = PasswordKey(domain);
+    const TDB_DATA value = tdb_fetch(tdb.get(), KeyOf(key));
+    if (value.dptr == nullptr) {
+        return std::nullopt;
+    }
+    std::string text(reinterpret_cast<const char*>(value.dptr), value.dsize);
+    explicit_bzero(value.dptr, value.dsize);
+    std::free(value.dptr);
+    return text;
+}
+
+}  // namespace
+
+bool HasMachineSecret(const std::string& path, const std::string& domain) {
+    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const Tdb tdb = OpenForReading(path);
+    if (!tdb) {
+        return false;
+    }
+    std::string key = PasswordKey(domain);
+    return tdb_exists(tdb.get(), KeyOf(key)) == 1;
+}
+
+void CopySecrets(const std::string& from, const std::string& to) {
+    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const Records records = ReadAll(from);
+    const std::string temporary = to + ".new";
+    if (unlink(temporary.c_str()) != 0 && errno != ENOENT) {
+        Throw(temporary, errno);
+    }
+    {
+        Tdb tdb = Open(temporary, O_RDWR | O_CREAT | O_EXCL);
+        if (!tdb || tdb_transaction_start(tdb.get()) != 0) {
+            Throw(temporary, errno);
+        }
+        for (const auto& [name, bytes] : records) {
+            std::string key = name;
+            if (tdb_store(tdb.get(), KeyOf(key), bytes->data(), TDB_REPLACE) != 0) {
+                Throw(temporary, ENOSPC);
+            }
+        }
+        if (tdb_transaction_commit(tdb.get()) != 0) {
+            Throw(temporary, ENOSPC);
+        }
+    }
+    if (const std::error_code error = RenameFile(temporary, to)) {
+        unlink(temporary.c_str());
+        throw std::system_error(error, to);
+    }
+}
+
+void ReplaceSecrets(const std::string& path, const std::string& source, const std::vector<SecretsOwner>& owners) {
+    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const Records wanted = source.empty() ? Records() : ReadAll(source);
+    Tdb tdb = Open(path, source.empty() ? O_RDWR : O_RDWR | O_CREAT);
+    if (!tdb) {
+        if (source.empty() && errno == ENOENT) {
+            return;
+        }
+        Throw(path, errno);
+    }
+    if (!WithinWait([&] { return tdb_transaction_start_nonblock(tdb.get()) == 0; })) {
+        Throw(path, EAGAIN);
+    }
+    Records present;
+    bool good = tdb_traverse_read(tdb.get(), CollectRecord, &present) >= 0;
+    for (auto record = present.begin(); good && record != present.end(); ++record) {
+        std::string key = record->first;
+        if (OwnedByAny(owners, key)) {
+            good = tdb_delete(tdb.get(), KeyOf(key)) == 0;
+        }
+    }
+    for (auto record = wanted.begin(); good && record != wanted.end(); ++record) {
+        std::string key = record->first;
+        if (OwnedByAny(owners, key)) {
+            good = tdb_store(tdb.get(), KeyOf(key), record->second->data(), TDB_REPLACE) == 0;
+        }
+    }
+    if (!good) {
+        tdb_transaction_cancel(tdb.get());
+        Throw(path, EIO);
+    }
+    if (tdb_transaction_commit(tdb.get()) != 0) {
+        Throw(path, EIO);
+    }
+}
+
+bool SameMachineSecret(const std::string& first, const std::string& second, const std::string& domain) {
+    const std::lock_guard<std::mutex> guard(OneAtATime());
+    std::optional<std::string> one = StoredPassword(first, domain);
+    std::optional<std::string> other = StoredPassword(second, domain);
+    const bool same = one == other;
+    for (std::optional<std::string>* text : {&one, &other}) {
+        if (text->has_value()) {
+            explicit_bzero((*text)->data(), (*text)->size());
+        }
+    }
+    return same;
+}
+
+}  // namespace appliance

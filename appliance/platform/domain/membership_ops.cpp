@@ -1,0 +1,210 @@
+// The contract's questions about the membership, and the settings that belong to it.
+
+#include "appliance/platform/contract.h"
+//
+#include <string>
+#include <string_view>
+
+#include "appliance/base/conf_file.h"
+#include "appliance/base/file.h"
+#include "appliance/base/paths.h"
+#include "appliance/base/settings.h"
+#include "appliance/base/text.h"
+#include "appliance/domain/join/machine_account.h"
+#include "appliance/domain/join/provisional.h"
+#include "appliance/domain/membership/membership.h"
+#include "appliance/platform/domain/time_task.h"
+#include "appliance/platform/last_error.h"
+
+namespace {
+
+using appliance::DomainKind;
+using appliance::Membership;
+using appliance::Path;
+
+constexpr std::chrono::milliseconds kTestDeadline{10000};
+constexpr std::chrono::milliseconds kLockWait{5000};
+constexpr char kNsswitch[] = "/etc/nsswitch.conf";
+constexpr std::size_t kLargestNsswitch = 1 << 20;
+constexpr char kSyncKey[] = "vorn sync dctime";
+constexpr char kGlobal[] = "global";
+
+// The membership; an unreadable configuration is none, and logged.
+Membership MembershipOrNone() {
+    Membership membership;
+    if (const std::error_code error = appliance::ReadMembership(membership)) {
+        appliance::Log(LOG_ERR, Path(appliance::kSmbConf) + ": " + error.message());
+        return {};
+    }
+    return membership;
+}
+
+// "passwd:  files ldap [NOTFOUND=return] # why" names "ldap".
+bool NamesDirectory(std::string_view line) {
+    const std::string text = appliance::Trim(line.substr(0, line.find('#')));
+    const std::size_t colon = text.find(':');
+    if (colon == std::string::npos || appliance::Trim(text.substr(0, colon)) != "passwd") {
+        return false;
+    }
+    std::string rest = text.substr(colon + 1);
+    for (char& letter : rest) {
+        letter = letter == '\t' ? ' ' : letter;
+    }
+    for (const std::string& source : appliance::Split(rest, " ")) {
+        if (source == "ldap" || source == "sss") {
+            return true;
+        }
+    }
+    return false;
+}
+
+}  // namespace
+
+extern "C" {
+
+int WINIQuery1(char* name, int size, int* first, int* second) {
+    VORN_GUARD(-1, {
+        if (first == nullptr) {
+            return VORN_FAIL(BadArgument);
+        }
+        Membership membership;
+        if (appliance::ReadMembership(membership)) {
+            return VORN_FAIL(FileRead);
+        }
+        if (!appliance::CopyToBuffer(membership.domain, name, size)) {
+            return VORN_FAIL(BadArgument);
+        }
+        *first = membership.DomainMode() ? 1 : 0;
+        if (second != nullptr) {
+            *second = membership.Joined() ? 1 : 0;
+        }
+        return 0;
+    })
+}
+
+int VORNWorkgroupGet(char* workgroup, int size) {
+    VORN_GUARD(-1, {
+        Membership membership;
+        if (appliance::ReadMembership(membership)) {
+            return VORN_FAIL(FileRead);
+        }
+        if (!appliance::CopyToBuffer(membership.domain, workgroup, size)) {
+            return VORN_FAIL(BadArgument);
+        }
+        return 0;
+    })
+}
+
+int VORNWinsIsJoined(void) {
+    VORN_GUARD(0, { return MembershipOrNone().Joined() ? 1 : 0; })
+}
+
+int VORNWinADSJoined(void) {
+    VORN_GUARD(0, { return MembershipOrNone().kind == DomainKind::ActiveDirectory ? 1 : 0; })
+}
+
+int VORNWinsIsOwnDomain(const char* domain) {
+    VORN_GUARD(0, {
+        if (domain == nullptr || *domain == '\0') {
+            return 0;
+        }
+        const Membership membership = MembershipOrNone();
+        const bool own = membership.DomainMode() && (appliance::EqualIgnoringCase(domain, membership.domain) ||
+                                                     appliance::EqualIgnoringCase(domain, membership.realm));
+        return own ? 1 : 0;
+    })
+}
+
+int VORNWinTestJoin(int ads) {
+    VORN_GUARD(-1, {
+        Membership membership = MembershipOrNone();
+        if (!membership.Joined()) {
+            return VORN_FAIL(NotMember);
+        }
+        membership.kind = ads != 0 ? DomainKind::ActiveDirectory : DomainKind::Nt4;
+        std::string words;
+        switch (appliance::TestSecret(membership, "", "", kTestDeadline, &words)) {
+            case appliance::SecretState::Works:
+                return 0;
+            case appliance::SecretState::Refused:
+                appliance::Log(LOG_WARNING, "the domain refuses the machine account: " + words);
+                return VORN_FAIL(Refused);
+            case appliance::SecretState::Unknown:
+                break;
+        }
+        appliance::Log(LOG_WARNING, "the membership could not be tested: " + words);
+        return VORN_FAIL(Unreachable);
+    })
+}
+
+int VORNWinIsEnableTrustDomain(void) {
+    VORN_GUARD(0, { return appliance::TrustedDomainsEnabled() ? 1 : 0; })
+}
+
+int VORNWinSetTrustDomain(int setting) {
+    VORN_GUARD(-1, {
+        if (setting != 0 && setting != 1) {
+            return VORN_FAIL(BadArgument);
+        }
+        const char* former = appliance::TrustedDomainsEnabled() ? "yes" : "no";
+        const char* wanted = setting == 1 ? "yes" : "no";
+        // smb.conf is left alone: the join that this belongs to writes it, when it succeeds.
+        appliance::NoteTrustChange(former, wanted);
+        if (const std::error_code error = appliance::SetSetting("trustdomain", wanted)) {
+            appliance::Log(LOG_ERR, Path(appliance::kSettings) + ": " + error.message());
+            return error == std::errc::timed_out ? VORN_FAIL(FileLock) : VORN_FAIL(FileWrite);
+        }
+        return 0;
+    })
+}
+
+int VORNWinsSetSectionKey(const char* section, const char* key, const char* value) {
+    VORN_GUARD(-1, {
+        if (section == nullptr || key == nullptr || value == nullptr) {
+            return VORN_FAIL(BadArgument);
+        }
+        {
+            const auto lock = appliance::LockSmbConf(kLockWait);
+            if (!lock) {
+                return VORN_FAIL(FileLock);
+            }
+            appliance::ConfFile conf;
+            if (appliance::ConfFile::Load(Path(appliance::kSmbConf), conf, false)) {
+                return VORN_FAIL(FileRead);
+            }
+            const std::string before = conf.text();
+            if (!conf.Set(section, key, value)) {
+                return VORN_FAIL(BadData);
+            }
+            if (conf.text() != before) {
+                if (const std::error_code error = conf.Save(Path(appliance::kSmbConf))) {
+                    appliance::Log(LOG_ERR, Path(appliance::kSmbConf) + ": " + error.message());
+                    return VORN_FAIL(FileWrite);
+                }
+            }
+        }
+        // The key is written; what it asks for is done by a task, whose failure is in the log.
+        if (appliance::SameKey(section, kGlobal) && appliance::SameKey(key, kSyncKey) &&
+            appliance::ApplyTimeSynchronisation() < 0) {
+            appliance::Log(LOG_ERR, "the task that synchronises the clock could not be set up");
+        }
+        return 0;
+    })
+}
+
+int VORNLDAPIsBinded(int) {
+    VORN_GUARD(0, {
+        std::string text;
+        if (appliance::ReadFile(Path(kNsswitch), text, kLargestNsswitch)) {
+            return 0;
+        }
+        for (const std::string& line : appliance::Lines(text)) {
+            if (NamesDirectory(line)) {
+                return 1;
+            }
+        }
+        return 0;
+    })
+}
+
+}  // extern "C"

@@ -1,0 +1,133 @@
+// vornctl leave
+
+#include <CLI/CLI.hpp>
+
+#include "appliance/tools/vornctl/steps.h"
+#include "appliance/tools/vornctl/terminal.h"
+
+namespace appliance::ctl {
+
+namespace {
+
+constexpr std::size_t kIndent = 11;
+
+struct LeaveOptions {
+    bool deleteAccount = false;
+    std::string user;
+    bool passwordFromInput = false;
+    bool yes = false;
+};
+
+// The domain that the appliance is a working member of; empty when it is none, or does not tell. Throws Failure, so
+// that nobody is asked for anything when the server does not answer.
+std::string DomainToLeave(const Context& context) {
+    return TextOf(context.client.Call(methods::Get()).data, "domain_name");
+}
+
+// True when the administrator wants it.
+bool Confirm(Context& context, const LeaveOptions& options, const std::string& domain) {
+    if (options.yes) {
+        return true;
+    }
+    if (!CanAsk()) {
+        throw Failure(kUsage, "There is no terminal to confirm this on: use --yes.");
+    }
+    Output& err = context.err;
+    if (domain.empty()) {
+        err.Line("The appliance is not a working member of a domain. What is left of a membership");
+        err.Line("is cleared.");
+    } else {
+        err.Paragraph(
+            "", 0,
+            "The appliance leaves the domain " + Escape(domain) + ". Its users lose their access to the shares.");
+    }
+    err.Line(options.deleteAccount ? "The appliance's computer account is deleted on the domain controller."
+                                   : "The appliance's computer account stays on the domain controller.");
+    const std::string answer = Ask("Leave? [y/N] ");
+    return answer == "y" || answer == "yes";
+}
+
+Answer RunCall(LiveSteps& steps, const LeaveOptions& options, const Secret& password) {
+    Json::Value request;
+    if (!options.deleteAccount) {
+        request["enable_domain"] = false;
+        return steps.Run(methods::Set(), request, nullptr);
+    }
+    request["delete_account"] = true;
+    request["username"] = options.user;
+    return steps.Run(methods::Leave(), request, &password);
+}
+
+// What stays behind, as the appliance names it.
+void SayWhatStays(Output& out, const LeaveOptions& options, const std::string& domain, const LiveSteps& steps) {
+    bool named = false;
+    for (const Json::Value& leftover : ListOf(steps.record(), "leftovers")) {
+        if (leftover.isString()) {
+            out.Paragraph("  Note:", kIndent, Escape(leftover.asString()));
+            named = true;
+        }
+    }
+    if (!named && !options.deleteAccount && !domain.empty()) {
+        out.Paragraph("  Note:", kIndent,
+                      "The appliance's computer account stays in the domain " + Escape(domain) + ".");
+    }
+}
+
+int RunLeave(Context& context, const LeaveOptions& options) {
+    if (options.deleteAccount && options.user.empty()) {
+        throw Failure(kUsage, "--delete-account needs --user: an account that may delete the computer account.");
+    }
+    if (!options.deleteAccount && (!options.user.empty() || options.passwordFromInput)) {
+        throw Failure(kUsage, "--user and --password-stdin go with --delete-account: leaving alone needs no account.");
+    }
+    const std::string domain = context.json && options.yes ? "" : DomainToLeave(context);
+    if (!Confirm(context, options, domain)) {
+        throw Failure(kInterrupted, "Nothing was changed.");
+    }
+    Secret password;
+    if (options.deleteAccount) {
+        password = options.passwordFromInput ? ReadPasswordFromInput()
+                                             : AskPassword("Password of " + Escape(options.user) + ": ");
+    }
+    LiveSteps steps(context);
+    if (!context.json) {
+        context.out.Line("Leaving the domain.");
+    }
+    const Answer answer = RunCall(steps, options, password);
+    if (context.json) {
+        PrintJson(context, answer);
+        return answer.success ? kDone : kRefused;
+    }
+    if (!answer.success) {
+        return ReportRefusal(context, answer, steps.Details());
+    }
+    if (domain.empty() && steps.record().isNull()) {
+        context.out.Line("The appliance is not a member of a domain.");
+        return kDone;
+    }
+    context.out.Line(context.out.Coloured(Colour::Good, "The appliance is no member of a domain any more."));
+    SayWhatStays(context.out, options, domain, steps);
+    return kDone;
+}
+
+}  // namespace
+
+Runner SetUpLeave(CLI::App& parser) {
+    const auto options = std::make_shared<LeaveOptions>();
+    parser.add_flag("--delete-account", options->deleteAccount,
+                    "delete the appliance's computer account on the domain controller, too");
+    parser.add_option("-u,--user", options->user, "account of the domain that may delete it, with --delete-account")
+        ->type_name("ACCOUNT");
+    parser.add_flag("--password-stdin", options->passwordFromInput,
+                    "read that account's password from standard input instead of asking for it");
+    parser.add_flag("-y,--yes", options->yes, "leave without asking");
+    parser.footer(
+        "Leaving needs no password and works also when no controller answers. The\n"
+        "computer account then stays on the controller; its name is printed.\n\n"
+        "Examples:\n"
+        "  vornctl leave\n"
+        "  vornctl leave --delete-account --user Administrator");
+    return [options](Context& context) { return RunLeave(context, *options); };
+}
+
+}  // namespace appliance::ctl

@@ -1,0 +1,85 @@
+#include "appliance/vornd/options.h"
+
+#include <getopt.h>
+
+#include <array>
+
+namespace appliance {
+
+const char* const kHelp =
+    "Usage: vornd [OPTION]...\n"
+    "Serves the appliance's web API on a unix socket, as root. Stays in the foreground of whatever starts it.\n"
+    "\n"
+    "  --foreground    log to the terminal, too, also when standard error is none\n"
+    "  --socket FILE   listen on FILE instead of /run/vorn/vornd.sock\n"
+    "  --module FILE   load FILE beside the modules in /usr/vorn/lib/modules; may be given several times\n"
+    "  --root FOLDER   look for the appliance's files under FOLDER; for tests\n"
+    "  --task ID       run the recorded background task ID and end; used by the server itself\n"
+    "  --help          show this text and end\n"
+    "  --version       show the version and end\n"
+    "\n"
+    "SIGTERM, SIGINT and SIGHUP end the server: waiting calls are refused, running ones are answered.\n"
+    "Exit status: 0 ended in order, 1 could not start or left calls behind, 2 wrong command line.\n";
+
+bool ParseOptions(int count, char** arguments, Options& options, std::string& reason) {
+    enum Option : int { Foreground = 256, Socket, ModuleFile, Root, Task, Help, Version };
+    const std::array<option, 8> known{{{"foreground", no_argument, nullptr, Foreground},
+                                       {"socket", required_argument, nullptr, Socket},
+                                       {"module", required_argument, nullptr, ModuleFile},
+                                       {"root", required_argument, nullptr, Root},
+                                       {"task", required_argument, nullptr, Task},
+                                       {"help", no_argument, nullptr, Help},
+                                       {"version", no_argument, nullptr, Version},
+                                       {nullptr, 0, nullptr, 0}}};
+    optind = 1;
+    opterr = 0;
+    for (;;) {
+        const int place = optind;
+        const int option = getopt_long(count, arguments, ":", known.data(), nullptr);
+        if (option < 0) {
+            break;
+        }
+        if (option != Foreground && option != Help && option != Version && option != '?' && option != ':' &&
+            *optarg == '\0') {
+            reason = std::string("option \"") + arguments[place] + "\" needs a value";
+            return false;
+        }
+        switch (option) {
+            case Foreground:
+                options.foreground = true;
+                break;
+            case Socket:
+                options.socket = optarg;
+                break;
+            case ModuleFile:
+                options.modules.emplace_back(optarg);
+                break;
+            case Root:
+                options.root = optarg;
+                break;
+            case Task:
+                options.action = Options::Action::Task;
+                options.task = optarg;
+                break;
+            case Help:
+                options.action = Options::Action::Help;
+                return true;
+            case Version:
+                options.action = Options::Action::Version;
+                return true;
+            case ':':
+                reason = std::string("option \"") + arguments[place] + "\" needs a value";
+                return false;
+            default:
+                reason = std::string("option \"") + arguments[place] + "\" is unknown or wrong; try --help";
+                return false;
+        }
+    }
+    if (optind < count) {
+        reason = std::string("\"") + arguments[optind] + "\" is one argument too many; try --help";
+        return false;
+    }
+    return true;
+}
+
+}  // namespace appliance

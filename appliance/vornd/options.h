@@ -1,0 +1,28 @@
+// The command line of vornd.
+
+#ifndef VORN_APPLIANCE_VORND_OPTIONS_H
+#define VORN_APPLIANCE_VORND_OPTIONS_H
+
+#include <string>
+#include <vector>
+
+namespace appliance {
+
+struct Options {
+    enum class Action { Serve, Task, Help, Version };
+    Action action = Action::Serve;
+    bool foreground = false;
+    std::string root;    // in front of all fixed paths; for tests
+    std::string socket;  // empty: the appliance's own
+    std::vector<std::string> modules;
+    std::string task;  // id of a recorded task
+};
+
+// Reads the command line. False, and the reason in one line, when it is wrong.
+bool ParseOptions(int count, char** arguments, Options& options, std::string& reason);
+
+extern const char* const kHelp;
+
+}  // namespace appliance
+
+#endif

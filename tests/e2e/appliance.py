@@ -1,0 +1,159 @@
+"""One appliance of the lab: its programs, its files, its web API."""
+
+import contextlib
+import hashlib
+import time
+
+from client import Client
+
+# What a failed join must not change, nor anything that is refused.
+CONFIGURATION = (
+    "/usr/vorn/etc/smb.conf",
+    "/etc/resolv.conf",
+    "/etc/vorninfo.conf",
+    "/etc/krb5.keytab",
+    "/etc/krb5.conf",
+    "/usr/vorn/etc/schedule.conf",
+    "/etc/cron.d/vorn",
+)
+SMBINFO = "/usr/vorn/etc/smbinfo.conf"
+
+
+class Appliance:
+    """HOST of the lab, on which vornd runs."""
+
+    def __init__(self, lab, host):
+        self.lab = lab
+        self.host = host
+
+    @property
+    def client(self):
+        return Client(str(self.path("/run/vorn/vornd.sock")))
+
+    # Programs.
+
+    def exec(self, *words, deadline=60, input=None, env=None):
+        return self.lab.exec(self.host, *words, deadline=deadline, input=input, env=env)
+
+    def must(self, *words, deadline=60, input=None, env=None):
+        result = self.exec(*words, deadline=deadline, input=input, env=env)
+        assert result.code == 0, result
+        return result
+
+    def ctl(self, *words, deadline=120, input=None):
+        return self.exec("/usr/vorn/bin/vornctl", *words, deadline=deadline, input=input)
+
+    def start(self):
+        self.lab.vornd(self.host, "start")
+
+    def stop(self):
+        self.lab.vornd(self.host, "stop")
+
+    def kill(self):
+        self.lab.vornd(self.host, "kill")
+
+    def renew(self):
+        """The machine as it was before its first start, vornd running."""
+        self.lab.must("renew", self.host)
+        self.start()
+
+    def net(self, *words, user=None, password=None, deadline=60):
+        """Samba's "net" on the appliance's own configuration."""
+        login = ["-U", user] if user else []
+        return self.exec(
+            "net",
+            "--configfile=/usr/vorn/etc/smb.conf",
+            *words,
+            *login,
+            deadline=deadline,
+            env={"PASSWD": password} if password else None,
+        )
+
+    # Files.
+
+    def path(self, path):
+        """Where a file of the appliance is to be found on this machine."""
+        return self.lab.root(self.host) / path.lstrip("/")
+
+    def read(self, path):
+        """The content as bytes; None when there is no such file."""
+        try:
+            return self.path(path).read_bytes()
+        except FileNotFoundError:
+            return None
+
+    def write(self, path, content):
+        self.path(path).write_bytes(content.encode() if isinstance(content, str) else content)
+
+    def exists(self, path):
+        return self.path(path).exists()
+
+    def configuration(self):
+        """Content, mode and owner of the files that a failed join leaves alone."""
+        state = {}
+        for path in CONFIGURATION:
+            with contextlib.suppress(FileNotFoundError):
+                info = self.path(path).stat()
+                state[path] = (self.path(path).read_bytes(), oct(info.st_mode), info.st_uid, info.st_gid)
+        state[SMBINFO] = self.smbinfo_but("advanced_domain_option", "register nic")
+        return state
+
+    def smbinfo_but(self, *keys):
+        """The keys and values of smbinfo.conf, without some."""
+        lines = (self.read(SMBINFO) or b"").decode(errors="backslashreplace").splitlines()
+        pairs = {}
+        for line in lines:
+            if "=" in line:
+                key, value = (part.strip() for part in line.split("=", 1))
+                if key not in keys:
+                    pairs[key] = value
+        return pairs
+
+    def syslog(self):
+        return (self.read("/var/log/syslog") or b"").decode(errors="backslashreplace")
+
+    def option_of_samba(self, key):
+        """What the file-sharing service takes for the value of a key."""
+        result = self.must("testparm", "-s", f"--parameter-name={key}", "/usr/vorn/etc/smb.conf")
+        return result.out.strip()
+
+    # The membership, asked of Samba and not of the appliance's own programs.
+
+    def trust_works(self, kind="ads", deadline=30):
+        result = self.net(kind, "testjoin", deadline=deadline)
+        return result.code == 0 and "OK" in result.text
+
+    def wait_until(self, condition, seconds, what):
+        end = time.monotonic() + seconds
+        while not condition():
+            assert time.monotonic() < end, f"{what}: not within {seconds} s"
+            time.sleep(0.05)
+
+
+class Directory:
+    """What an Active Directory holds, seen on its controller."""
+
+    def __init__(self, lab, controller):
+        self.lab = lab
+        self.controller = controller
+
+    def search(self, expression, *attributes):
+        result = self.lab.exec(
+            self.controller, "ldbsearch", "-H", "/var/lib/samba/private/sam.ldb", expression, *attributes, deadline=30
+        )
+        assert result.code == 0, result
+        return result.out
+
+    def objects(self):
+        """Every object with its state, but for what a log-in alone changes; as a set of digests with names."""
+        records = self.search("(objectClass=*)", "distinguishedName", "userAccountControl", "servicePrincipalName")
+        found = set()
+        for record in records.split("\n\n"):
+            lines = sorted(line for line in record.splitlines() if line and not line.startswith("#"))
+            names = [line for line in lines if line.startswith("dn: ")]
+            if names:
+                found.add((names[0], hashlib.sha256("\n".join(lines).encode()).hexdigest()))
+        return found
+
+    def computer(self, name):
+        return f"CN={name.upper()}," in self.search(f"(sAMAccountName={name.upper()}$)", "dn")

@@ -1,0 +1,63 @@
+"""What the end-to-end tests share. See CAUTION: they need root, and bring up domain controllers on this machine."""
+
+import os
+
+import pytest
+
+from appliance import Appliance, Directory
+from lab import Lab, password
+
+
+def pytest_addoption(parser):
+    parser.addoption("--stage", metavar="FOLDER", help="the staged tree of the project, put into the appliances")
+
+
+def pytest_sessionstart(session):
+    if os.geteuid() != 0:
+        pytest.exit("only root can bring up a lab; run the end-to-end tests as root", returncode=4)
+
+
+@pytest.fixture(scope="session")
+def lab_folder(tmp_path_factory):
+    return tmp_path_factory.mktemp("lab")
+
+
+@pytest.fixture(scope="session")
+def lab(lab_folder, pytestconfig):
+    """All controllers, and the appliances nas1 and nas2. Tests leave it as they found it."""
+    lab = Lab(lab_folder / "state")
+    stage = pytestconfig.getoption("--stage")
+    try:
+        lab.up("--trust", "--nt4", "--appliances", "nas1,nas2", *(["--stage", stage] if stage else []))
+        yield lab
+    finally:
+        lab.down()
+
+
+@pytest.fixture
+def appliance(lab):
+    """nas1 as it is before its first start, vornd running; what it may have left in the directory is gone."""
+    machine = Appliance(lab, "nas1")
+    machine.renew()
+    remove_computer(lab, "nas1")
+    yield machine
+    lab.must("fault", "none", "dc1")
+
+
+@pytest.fixture
+def member(appliance):
+    """An appliance that has joined LAB.TEST."""
+    answer = appliance.client.join("lab.test", "Administrator", password("LAB", "Administrator"))
+    assert answer.ok, answer.body
+    return appliance
+
+
+@pytest.fixture
+def directory(lab):
+    return Directory(lab, "dc1")
+
+
+def remove_computer(lab, name):
+    if Directory(lab, "dc1").computer(name):
+        result = lab.exec("dc1", "samba-tool", "computer", "delete", name.upper(), deadline=30)
+        assert result.code == 0, result
