@@ -154,6 +154,8 @@ renew() {
     end_process "$folder/init" || true
     end_process "$folder/holder" || true
     until_true 10 is_gone "$folder/init" || die "$1 does not end"
+    # The kernel takes its time with the network of a host that is gone; the plug must be free at once.
+    inside "$SWITCH" ip link delete "p-$1" 2>/dev/null || true
     rm -rf --one-file-system -- "${folder:?}" "$STATE/$1.vornd.log"
     make_host "$1" appliance "$address"
     set_up_appliance "$1"

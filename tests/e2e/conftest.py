@@ -48,7 +48,7 @@ def appliance(lab):
 def member(appliance):
     """An appliance that has joined LAB.TEST."""
     answer = appliance.client.join("lab.test", "Administrator", password("LAB", "Administrator"))
-    assert answer.ok, answer.body
+    assert answer.ok, appliance.ctl("steps").text + appliance.syslog()
     return appliance
 
 

@@ -13,7 +13,7 @@ def test_the_whole_main_job(appliance, directory):
     assert client.domains(1) == []
 
     answer = client.join("lab.test", *ADMINISTRATOR)
-    assert answer.body == {"success": True, "data": None}, answer.body
+    assert answer.body == {"success": True, "data": None}, appliance.ctl("steps").text + appliance.syslog()
     assert directory.computer(appliance.host)
 
     status = client.get()
