@@ -116,13 +116,21 @@ host_is_made() {
     [[ -s $1/ready ]] || ! start_of "$2" >/dev/null
 }
 
+# The same for a host that is made anew: the others remember it for a while.
+hardware_address_of() {
+    local -a bytes
+    IFS=. read -ra bytes <<<"$1"
+    printf '02:00:%02x:%02x:%02x:%02x' "${bytes[@]}"
+}
+
 # Plugs a cable into the host and the switch.
 wire() {
     local name=$1 address=$2 switch init
     switch=$(pid_in "$STATE/hosts/$SWITCH/init") || die "the switch went down"
     init=$(pid_in "$STATE/hosts/$name/init") || die "the host $name went down"
     {
-        nsenter --target "$switch" --net -- ip link add "p-$name" type veth peer name eth0 netns "$init" &&
+        nsenter --target "$switch" --net -- ip link add "p-$name" type veth \
+            peer name eth0 address "$(hardware_address_of "$address")" netns "$init" &&
             nsenter --target "$switch" --net -- ip link set "p-$name" master br0 up &&
             nsenter --target "$init" --net -- ip addr add "$address/24" brd + dev eth0 &&
             nsenter --target "$init" --net -- ip link set eth0 up &&

@@ -1,0 +1,130 @@
+"""Join, join again, leave: of both kinds of domain, with controllers that work and that don't."""
+
+import pytest
+
+from client import DIRECTORY
+from lab import password
+
+ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
+NT_ADMINISTRATOR = ("Administrator", password("NT4DOM", "Administrator"))
+
+
+def secrets_of(machine):
+    return machine.must("sh", "-c", "tdbdump /var/lib/samba/private/secrets.tdb 2>/dev/null | grep -o 'key([0-9]*) = "
+                        "\"[^\"]*\"' || true").out
+
+
+def winbind_runs(machine):
+    return machine.exec("pgrep", "-x", "winbindd").code == 0
+
+
+def test_a_member_can_join_again(member):
+    answer = member.client.join("lab.test", *ADMINISTRATOR)
+    assert answer.ok, member.ctl("steps").text
+    assert member.trust_works()
+    assert member.client.test_dc() is True
+
+
+def test_a_leave_leaves_nothing_here_and_the_account_there(member, directory):
+    first = member.read("/usr/vorn/etc/smb.conf")
+    assert b"LAB.TEST" in first
+    answer = member.client.leave()
+    assert answer.ok
+    assert not member.exists("/etc/krb5.keytab")
+    assert not winbind_runs(member)
+    assert b"LAB" not in member.read("/usr/vorn/etc/smb.conf")
+    assert directory.computer(member.host)
+    # The network's records of the appliance are gone, too.
+    assert member.exec("dig", "+short", "nas1.lab.test", "@10.77.0.10").out.strip() == ""
+    steps = member.client.call(DIRECTORY, 1, "join_steps").data
+    assert any("NAS1$" in text for text in steps["leftovers"]), steps
+
+
+def test_leaving_and_joining_gives_the_same_configuration(member):
+    joined = member.read("/usr/vorn/etc/smb.conf")
+    assert member.client.leave().ok
+    assert member.client.join("lab.test", *ADMINISTRATOR).ok
+    assert member.read("/usr/vorn/etc/smb.conf") == joined
+
+
+@pytest.mark.parametrize("fault", ["dead", "ldap-drop", "smb-drop"])
+def test_a_leave_needs_no_controller(member, lab, fault):
+    with lab.fault(fault, "dc1", only=member.host):
+        answer = member.client.leave()
+    assert answer.ok
+    assert answer.seconds < 15
+    assert member.client.get() == {"enable_domain": False}
+    assert not winbind_runs(member)
+
+
+def test_a_leave_after_the_account_was_deleted(member, lab):
+    assert lab.exec("dc1", "samba-tool", "computer", "delete", "NAS1", deadline=30).code == 0
+    assert member.client.test_dc() is False
+    assert member.client.leave().ok
+    assert member.client.join("lab.test", *ADMINISTRATOR).ok
+    assert member.client.test_dc() is True
+
+
+def test_the_account_can_be_deleted_with_the_leave(member, directory):
+    result = member.ctl("leave", "--yes", "--delete-account", "--user", "Administrator", "--password-stdin",
+                        input=ADMINISTRATOR[1] + "\n")
+    assert result.code == 0, result
+    assert not directory.computer(member.host)
+
+
+def test_wrong_credentials_for_the_deletion_leave_a_member(member, directory):
+    result = member.ctl("leave", "--yes", "--delete-account", "--user", "Administrator", "--password-stdin",
+                        input="wrong\n")
+    assert result.code == 1, result
+    assert directory.computer(member.host)
+    assert member.client.test_dc() is True
+
+
+def test_trusted_domains_can_be_left_out(appliance):
+    answer = appliance.client.join("lab.test", *ADMINISTRATOR, manage_mode=1)
+    assert answer.ok, appliance.ctl("steps").text
+    assert appliance.client.get()["manage_mode"] == 1
+    assert appliance.client.domains(1) == ["LAB"]
+    rows = appliance.client.domains(2)
+    assert rows[0] == ["--", "", "LAB"]
+    assert any("Sales, West" in row[0] for row in rows), rows
+    assert appliance.option_of_samba("allow trusted domains") == "No"
+
+
+def test_the_whole_life_in_an_nt4_style_domain(appliance):
+    client = appliance.client
+    answer = client.join("NT4DOM", *NT_ADMINISTRATOR)
+    assert answer.ok, appliance.ctl("steps").text
+    status = client.get()
+    assert (status["domain_name"], status["domain_type"]) == ("NT4DOM", "NT4")
+    assert client.test_dc() is True
+    assert client.domains(1) == ["NT4DOM"]
+    assert client.refresh().data == {"status": "finish"}
+    users = client.call(DIRECTORY, 1, "users", {"domain": "NT4DOM", "offset": 0, "limit": 100}).data["entries"]
+    assert "nina" in {user["name"] for user in users}
+    assert client.join("NT4DOM", *NT_ADMINISTRATOR).ok
+    assert client.test_dc() is True
+    assert client.leave().ok
+    assert client.get() == {"enable_domain": False}
+
+
+NT4_REFUSED = [
+    ("Administrator", "wrong", 2611),
+    ("nina", password("NT4DOM", "nina"), 2611),
+]
+
+
+@pytest.mark.parametrize("user, secret, code", NT4_REFUSED)
+def test_refused_by_an_nt4_style_domain(appliance, user, secret, code):
+    before = appliance.configuration()
+    answer = appliance.client.join("NT4DOM", user, secret)
+    assert not answer.ok
+    assert answer.code in (code, 2610), appliance.ctl("steps").text
+    assert appliance.configuration() == before
+
+
+def test_a_member_changes_its_domain(member):
+    answer = member.client.join("NT4DOM", *NT_ADMINISTRATOR)
+    assert answer.ok, member.ctl("steps").text
+    assert member.client.get()["domain_name"] == "NT4DOM"
+    assert member.client.test_dc() is True
