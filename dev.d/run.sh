@@ -77,7 +77,8 @@ check_rights() {
 build_stage() {
     printf '\nBuilding the appliance\n'
     drop_foreign_build "$BUILD"
-    step cmake --preset release -B "${BUILD#"$ROOT"/}" -D VORN_BUILD_BENCH=OFF -D VORN_BUILD_LIBRARY_TESTS=OFF ||
+    step cmake --preset release -B "${BUILD#"$ROOT"/}" -D VORN_BUILD_APPLIANCE=ON \
+        -D VORN_BUILD_BENCH=OFF -D VORN_BUILD_LIBRARY_TESTS=OFF ||
         die "CMake could not configure the appliance"
     step --title "\$ cmake --build ${BUILD#"$ROOT"/}" \
         cmake --build "$BUILD" --parallel "$(cores)" --target "${TARGETS[@]}" ||

@@ -17,6 +17,7 @@
 #include <set>
 #include <thread>
 
+#include "appliance/base/file.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/process.h"
 #include "appliance/base/text.h"
@@ -337,8 +338,9 @@ TEST_F(CommandTest, TheCallersSignalsStayAsTheyAre) {
 // Every process' arguments, as anybody may read them.
 bool AnyArgumentHolds(const std::string& text) {
     for (const auto& entry : std::filesystem::directory_iterator("/proc")) {
-        std::ifstream file(entry.path() / "cmdline", std::ios::binary);
-        if (std::string(std::istreambuf_iterator<char>(file), {}).find(text) != std::string::npos) {
+        // A process that ends meanwhile has no arguments any more, and reading them fails.
+        std::string arguments;
+        if (!appliance::ReadFile(entry.path() / "cmdline", arguments) && arguments.find(text) != std::string::npos) {
             return true;
         }
     }
