@@ -23,6 +23,7 @@ namespace {
 
 // A writer that lives still has its temporary file in hand for some seconds.
 constexpr int kStaleAge = 60;
+constexpr int kStaleListAge = 3600;
 
 bool Exists(const std::string& path) {
     struct stat found {};
@@ -68,10 +69,12 @@ void CheckSamba() {
 void RemoveTemporaries() {
     int removed = 0;
     for (const std::string& folder :
-         {Path(kPrivate), Path(kDirectoryData), Path(kJoinJournal), Path(kState), Path(kRun), FolderOf(Path(kSmbConf)),
+         {Path(kPrivate), Path(kJoinJournal), Path(kState), Path(kRun), FolderOf(Path(kSmbConf)),
           FolderOf(Path(kSettings)), FolderOf(Path(kCronTable)), FolderOf(Path(kJoinStatus))}) {
         removed += Exists(folder) ? RemoveStaleTemporaries(folder, kStaleAge) : 0;
     }
+    // A refresh outlives the server, and may take its time for a list.
+    removed += Exists(Path(kDirectoryData)) ? RemoveStaleTemporaries(Path(kDirectoryData), kStaleListAge) : 0;
     if (removed > 0) {
         Log(LOG_NOTICE, std::to_string(removed) + " temporary files of killed writers removed");
     }

@@ -47,8 +47,8 @@ ListWriter::ListWriter(EntryKind kind, std::string_view domain) : kind_(kind), d
         throw std::system_error(error, "cannot make " + folder);
     }
     // A name that stands under none of the patterns by which lists are found or deleted.
-    std::string path = folder + "/." + NameOf(ListPath(kind_, domain_)) + ".XXXXXX";
-    file_.Reset(mkostemp(path.data(), O_CLOEXEC));
+    std::string path;
+    file_ = MakeTemporary(ListPath(kind_, domain_), path);
     if (!file_) {
         Fail("cannot make a file in " + folder);
     }

@@ -98,6 +98,21 @@ TEST(FirstStartTest, RemovesStaleTemporaryFilesOnly) {
     EXPECT_TRUE(fs::exists(other));
 }
 
+TEST(FirstStartTest, LeavesAListThatIsBeingFetched) {
+    Tree tree;
+    fs::create_directories(tree.At("/usr/vorn/etc/private/directory"));
+    const std::string abandoned = tree.At("/usr/vorn/etc/private/directory/.user_LAB.db.vorn-a1B2c3");
+    const std::string growing = tree.At("/usr/vorn/etc/private/directory/.user_LAB.db.vorn-d4E5f6");
+    for (const auto& [path, age] : {std::pair(abandoned, 4000), std::pair(growing, 1800)}) {
+        fs::copy_file(tree.At("/usr/vorn/share/capabilities.conf"), path);
+        const utimbuf old{std::time(nullptr) - age, std::time(nullptr) - age};
+        utime(path.c_str(), &old);
+    }
+    Server server(tree);
+    EXPECT_FALSE(fs::exists(abandoned));
+    EXPECT_TRUE(fs::exists(growing));
+}
+
 TEST(FirstStartTest, PutsADamagedTaskFileAside) {
     Tree tree;
     fs::create_directories(tree.At("/var/lib/vorn"));
