@@ -147,7 +147,9 @@ echo 1 >/proc/sys/net/ipv6/conf/all/disable_ipv6 2>/dev/null || true
 move=()
 if [[ $kind == switch ]]; then
     must mount -t proc proc /proc
-    must ip link add br0 type bridge
+    # Left to itself, a bridge takes the lowest address of its ports: each cable that is plugged in or pulled out could
+    # change it, and for seconds the hosts' questions to the name server would go to an address that is gone.
+    must ip link add br0 address 02:00:0a:4d:00:01 type bridge
     must ip addr add "$(<"$folder/address")/24" dev br0
     must ip link set br0 up
     # Packets for elsewhere are swallowed here, as a real gateway does with a dead network.

@@ -30,11 +30,11 @@ constexpr std::array kCaches = {
     "/var/cache/samba/gencache.tdb",          "/run/samba/gencache.tdb",
 };
 
-bool Answers(milliseconds deadline) {
+CommandResult Ping(milliseconds deadline) {
     SambaCall call;
     call.arguments = {"--ping"};
     call.deadline = deadline;
-    return RunWbinfo(call).Succeeded();
+    return RunWbinfo(call);
 }
 
 }  // namespace
@@ -50,30 +50,37 @@ std::string StartWinbind(milliseconds time) {
     if (!result) {
         return result.error;
     }
-    while (!Answers(budget.Left(kAttempt))) {
+    for (;;) {
+        const CommandResult ping = Ping(budget.Left(kAttempt));
+        // One that takes a question and gives no answer runs: it is busy.
+        if (ping.Succeeded() || ping.end == CommandResult::End::TimedOut) {
+            return "";
+        }
         if (budget.Over()) {
             return "winbindd does not answer";
         }
         std::this_thread::sleep_for(kPause);
     }
-    return "";
 }
 
-std::string ConfirmTrust(milliseconds time) {
+WinbindTrust ConfirmTrust(milliseconds time, std::string& words) {
     const TimeBudget budget(time);
     SambaCall call;
     call.arguments = {"--check-secret"};
-    std::string words = "not asked";
+    words = "not asked";
     while (budget.Left(time) >= kLeastAttempt) {
         call.deadline = budget.Left(time);
         const CommandResult result = RunWbinfo(call);
         if (result.Succeeded()) {
-            return "";
+            return WinbindTrust::Confirmed;
         }
         words = LastWords(result);
+        if (result.end == CommandResult::End::TimedOut) {
+            return WinbindTrust::Busy;
+        }
         std::this_thread::sleep_for(std::min(budget.Left(time), kLongPause));
     }
-    return words;
+    return WinbindTrust::Denied;
 }
 
 void RemoveDomainCaches() {
