@@ -21,7 +21,7 @@ FRESH_PACKAGES=(debootstrap)
 LAB_PACKAGES=(samba winbind samba-dsdb-modules samba-vfs-modules samba-ad-provision smbclient ldb-tools krb5-user
     libsasl2-modules-gssapi-mit bind9-dnsutils libnss-winbind nftables attr acl iproute2 procps busybox cron curl
     python3 python3-samba)
-E2E_PACKAGES=("${LAB_PACKAGES[@]}" python3-pytest)
+E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils python3-pytest python3-pytest-xdist)
 
 packages_of_preset() {
     case $1 in

@@ -1,15 +1,12 @@
 # ./dev run: an appliance that joins a real domain, and all that it does then.
 # shellcheck shell=bash disable=SC2153 # ROOT is of the file that reads this one
 
-for file in packages cmake run_steps; do
+for file in packages cmake stage run_steps; do
     # shellcheck source=/dev/null
     . "$ROOT/dev.d/$file.sh"
 done
 
 LAB=$ROOT/lab/lab
-BUILD=$ROOT/build/appliance
-STAGE=$ROOT/build/stage
-TARGETS=(vorn_directory_domain vorn_platform appliance_directory_module vornd vornctl vornwin vornjoin)
 
 usage() {
     cat <<'TEXT'
@@ -47,6 +44,7 @@ main() {
     ! "$LAB" status >/dev/null 2>&1 ||
         die "a lab is up already; \"./dev lab down\" takes it down. LAB_DIR names another folder for a second one"
     need_packages "${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}"
+    printf '\nBuilding the appliance\n'
     build_stage
     trap end_run EXIT
     trap interrupted INT TERM HUP
@@ -72,22 +70,6 @@ check_rights() {
     ((EUID == 0)) || die "only root can make namespaces and install packages. Run this as root"
     unshare --pid --fork --mount --net --uts --ipc --propagation unchanged true 2>/dev/null ||
         die "this machine does not let root make namespaces. In a container: start it privileged (docker: --privileged)"
-}
-
-build_stage() {
-    printf '\nBuilding the appliance\n'
-    drop_foreign_build "$BUILD"
-    step cmake --preset release -B "${BUILD#"$ROOT"/}" -D VORN_BUILD_APPLIANCE=ON \
-        -D VORN_BUILD_BENCH=OFF -D VORN_BUILD_LIBRARY_TESTS=OFF ||
-        die "CMake could not configure the appliance"
-    step --title "\$ cmake --build ${BUILD#"$ROOT"/}" \
-        cmake --build "$BUILD" --parallel "$(cores)" --target "${TARGETS[@]}" ||
-        die "the appliance could not be built"
-    rm -rf -- "$STAGE.new"
-    step --title "\$ cmake --install ${BUILD#"$ROOT"/} (into ${STAGE#"$ROOT"/})" \
-        env DESTDIR="$STAGE.new" cmake --install "$BUILD" --strip || die "the appliance could not be staged"
-    # Whole or not there, also when this is interrupted.
-    { rm -rf -- "$STAGE" && mv -- "$STAGE.new" "$STAGE"; } || die "${STAGE#"$ROOT"/} can't be replaced"
 }
 
 bring_up() {

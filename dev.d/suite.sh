@@ -6,7 +6,7 @@ ROOT=$(cd -- "$(dirname -- "${BASH_SOURCE[0]}")/.." && pwd -P)
 SUITE=$1
 # shellcheck disable=SC2034 # names the log
 COMMAND=$1
-for file in common packages sources cmake suites; do
+for file in common packages sources cmake stage suites; do
     # shellcheck source=/dev/null
     . "$ROOT/dev.d/$file.sh"
 done

@@ -1,7 +1,7 @@
 # The suites of "./dev test". Each one runs as a process of its own (suite.sh) and leaves its counts with "count".
 # shellcheck shell=bash disable=SC2034,SC2153 # variables shared with the files that read this one
 
-SUITES=(format shell clang lint unit corpus sweep threads coverage library platform)
+SUITES=(format shell clang lint unit corpus sweep threads coverage library platform lab)
 QUICK_SUITES=(format shell unit corpus library)
 
 about_suite() {
@@ -16,6 +16,7 @@ about_suite() {
         threads) say "requests on several threads, with the thread sanitizer" ;;
         coverage) say "the unit tests reach every line and every branch of src/" ;;
         library) say "the built library: symbols, linking, loading, all operations in a host" ;;
+        lab) say "the appliance in real domains: joins, tests, lists, refreshes, faults, kills" ;;
         platform) say "the appliance on Debian without a domain, with address and undefined-behaviour sanitizers" ;;
     esac
 }
@@ -36,6 +37,7 @@ packages_of_suite() {
         clang) printf '%s\n' "${CLANG_PACKAGES[@]}" ;;
         lint) printf '%s\n' "${LINT_PACKAGES[@]}" ;;
         platform) printf '%s\n' "${PLATFORM_PACKAGES[@]}" ;;
+        lab) printf '%s\n' "${E2E_PACKAGES[@]}" ;;
         unit | corpus | sweep | threads) printf '%s\n' "${TEST_PACKAGES[@]}" ;;
         coverage) printf '%s\n' "${COVERAGE_PACKAGES[@]}" ;;
         library) printf '%s\n' "${RELEASE_PACKAGES[@]}" ;;
@@ -196,4 +198,37 @@ show_gaps() {
 suite_library() {
     configure release && build release || return 1
     run_ctest_and_count build/release/tests/library --label-regex '^library$'
+}
+
+# Each worker has a lab of its own. Two of them, since a lab mostly waits, and the tests know how long things may take.
+suite_lab() {
+    local results=$LOGS/lab.xml begin=$EPOCHREALTIME result=0 tests=0 failed=0
+    build_stage
+    rm -f -- "$results"
+    say "  \$ pytest tests/e2e"
+    /usr/bin/python3 -m pytest -p no:cacheprovider -n 2 --dist loadfile -v --durations=25 --junitxml "$results" \
+        --stage "$STAGE" tests/e2e 2>&1 </dev/null | tee -a "$LOG" | show_progress || result=$?
+    printf '  %-62s %8s s\n' "" "$(seconds_since "$begin")"
+    if [[ -f $results ]]; then
+        read -r tests failed < <(sum_of_results "$results")
+    fi
+    count "$tests" "$failed"
+    return "$result"
+}
+
+# What fails, at once, and a line for each tenth of the tests.
+show_progress() {
+    awk '
+        / (FAILED|ERROR) tests/ { print "  failed: " $NF; fflush() }
+        match($0, /\[ *[0-9]+%\]/) {
+            tenth = int(substr($0, RSTART + 1, RLENGTH - 3) / 10)
+            if (tenth > shown) { print "  " tenth * 10 " %"; fflush(); shown = tenth }
+        }
+        /^E  / && ++lines <= 100 { print "    | " $0 }'
+}
+
+# sum_of_results FILE: how many tests ran, and how many of them failed or were skipped, which proves nothing.
+sum_of_results() {
+    sed -n 's/.*<testsuite [^>]*errors="\([0-9]*\)" failures="\([0-9]*\)" skipped="\([0-9]*\)" tests="\([0-9]*\)".*/\4 \1 \2 \3/p' \
+        "$1" | awk '{ tests += $1; failed += $2 + $3 + $4 } END { print tests + 0, failed + 0 }'
 }

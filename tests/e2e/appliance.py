@@ -137,10 +137,9 @@ class Directory:
         self.lab = lab
         self.controller = controller
 
-    def search(self, expression, *attributes):
-        result = self.lab.exec(
-            self.controller, "ldbsearch", "-H", "/var/lib/samba/private/sam.ldb", expression, *attributes, deadline=30
-        )
+    def search(self, expression, *attributes, base=None):
+        words = ["ldbsearch", "-H", "/var/lib/samba/private/sam.ldb", *(["-b", base] if base else [])]
+        result = self.lab.exec(self.controller, *words, expression, *attributes, deadline=30)
         assert result.code == 0, result
         return result.out
 

@@ -14,6 +14,10 @@ def secrets_of(machine):
                         "\"[^\"]*\"' || true").out
 
 
+def lists(machine):
+    return machine.client.call(DIRECTORY, 1, "domains").data["domains"]
+
+
 def winbind_runs(machine):
     return machine.exec("pgrep", "-x", "winbindd").code == 0
 
@@ -28,14 +32,17 @@ def test_a_member_can_join_again(member):
 def test_a_leave_leaves_nothing_here_and_the_account_there(member, directory):
     first = member.read("/usr/vorn/etc/smb.conf")
     assert b"LAB.TEST" in first
+    assert member.client.refresh().ok
+    assert [row["count"] > 0 for row in lists(member)] == [True] * 4
     answer = member.client.leave()
     assert answer.ok
     assert not member.exists("/etc/krb5.keytab")
     assert not winbind_runs(member)
     assert b"LAB" not in member.read("/usr/vorn/etc/smb.conf")
     assert directory.computer(member.host)
+    assert lists(member) == []
     # The network's records of the appliance are gone, too.
-    assert member.exec("dig", "+short", "nas1.lab.test", "@10.77.0.10").out.strip() == ""
+    assert member.exec("dig", "+short", "nas1.lab.test", "@10.77.0.10").out.strip() == "", member.ctl("steps").text
     steps = member.client.call(DIRECTORY, 1, "join_steps").data
     assert any("NAS1$" in text for text in steps["leftovers"]), steps
 

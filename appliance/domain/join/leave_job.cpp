@@ -24,7 +24,7 @@ namespace {
 
 using std::chrono::milliseconds;
 
-constexpr milliseconds kDnsWait{3000};
+constexpr milliseconds kDnsWait{5000};
 constexpr milliseconds kFindWait{3000};
 constexpr milliseconds kTicketWait{4000};
 constexpr milliseconds kDeleteWait{5000};

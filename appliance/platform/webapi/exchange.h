@@ -17,7 +17,7 @@ struct TaskHost;
 
 namespace VORN {
 
-class __attribute__((visibility("hidden"))) APIRequest::Impl {
+class APIRequest::Impl {
 public:
     // The parameters of the call: a JSON object.
     Json::Value parameters = Json::Value(Json::objectValue);
@@ -27,7 +27,7 @@ public:
     const appliance::TaskHost* taskHost = nullptr;
 };
 
-class __attribute__((visibility("hidden"))) APIResponse::Impl {
+class APIResponse::Impl {
 public:
     bool answered = false;
     bool success = false;

@@ -16,6 +16,7 @@
 #include <string>
 
 #include "appliance/base/log.h"
+#include "appliance/domain/directory/directory_store.h"
 #include "appliance/domain/directory/domain_list.h"
 #include "appliance/domain/join/join_request.h"
 #include "appliance/domain/join/launcher.h"
@@ -117,6 +118,10 @@ int DoAsRequested() {
         }
     }
     const appliance::JobResult result = appliance::RunJob(request, {RefreshKnownDomains});
+    if (result.success && request.action == appliance::JoinRequest::Action::Leave) {
+        // Nobody can refresh them any more. What can't be removed is logged there.
+        static_cast<void>(appliance::RemoveLists());
+    }
     // Whoever asked may be gone by now.
     std::fputs(appliance::FormatJobResult(result).c_str(), stdout);
     std::fflush(stdout);
