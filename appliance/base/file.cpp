@@ -163,7 +163,7 @@ FileDescriptor MakeTemporary(const std::string& path, std::string& name) {
     const std::string folder = FolderOf(path);
     name = (folder == "/" ? "" : folder) + "/." + NameOf(path) + std::string(kTemporaryMark) +
            std::string(kTemporaryLetters, 'X');
-    return FileDescriptor(mkostemp(&name[0], O_CLOEXEC));
+    return FileDescriptor(mkostemp(name.data(), O_CLOEXEC));
 }
 
 std::string TemporaryTarget(const std::string& name) {
@@ -192,7 +192,7 @@ std::error_code FollowLinks(const std::string& path, std::string& target) {
             return {};
         }
         std::string next(PATH_MAX, '\0');
-        const ssize_t length = readlink(target.c_str(), &next[0], next.size());
+        const ssize_t length = readlink(target.c_str(), next.data(), next.size());
         if (length < 0) {
             return Errno();
         }

@@ -80,10 +80,9 @@ bool Statement::Step() {
     }
     if (code != SQLITE_DONE) {
         // The text of the error first: the reset may replace it.
-        const SqliteError error(code,
-                                std::string(sqlite3_db_filename(database_, "main")) + ": " + sqlite3_errmsg(database_));
+        const std::string text = std::string(sqlite3_db_filename(database_, "main")) + ": " + sqlite3_errmsg(database_);
         sqlite3_reset(statement_.get());
-        throw error;
+        throw SqliteError(code, text);
     }
     return false;
 }

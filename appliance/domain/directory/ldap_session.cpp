@@ -35,7 +35,7 @@ void Set(LDAP* session, int option, const void* value) {
 }
 
 // The ticket says all that the server wants to know, so there is nothing to answer.
-int AnswerNothing(LDAP*, unsigned, void*, void*) {
+int AnswerNothing(LDAP* /*session*/, unsigned /*flags*/, void* /*defaults*/, void* /*interaction*/) {
     return LDAP_SUCCESS;
 }
 
@@ -236,7 +236,7 @@ std::optional<std::uint32_t> RidOfSid(std::string_view sid) {
         return static_cast<std::uint32_t>(byte(place)) | static_cast<std::uint32_t>(byte(place + 1)) << 8 |
                static_cast<std::uint32_t>(byte(place + 2)) << 16 | static_cast<std::uint32_t>(byte(place + 3)) << 24;
     };
-    if (sid.size() != kHead + 4 * kNumbers || byte(0) != 1 || byte(1) != kNumbers ||
+    if (sid.size() != kHead + std::size_t{4} * kNumbers || byte(0) != 1 || byte(1) != kNumbers ||
         sid.substr(2, 6) != std::string_view("\0\0\0\0\0\5", 6) || number(0) != kDomainSids) {
         return std::nullopt;
     }

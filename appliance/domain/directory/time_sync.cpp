@@ -17,7 +17,7 @@ namespace appliance {
 namespace {
 
 constexpr std::int64_t kSmallest = 2;
-constexpr std::int64_t kLargest = 24 * 60 * 60;
+constexpr std::int64_t kLargest = std::int64_t{24} * 60 * 60;
 constexpr std::int64_t kEarliest = 1767225600;  // 2026-01-01
 constexpr std::chrono::milliseconds kDeadline{7000};
 constexpr std::int64_t kNanoseconds = 1000000000;

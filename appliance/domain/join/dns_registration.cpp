@@ -86,17 +86,17 @@ std::string RegisteredName(const Membership& membership) {
 }
 
 std::string RegisterInDns(const Membership& membership, const std::vector<std::string>& addresses,
-                          const Credentials& credentials, std::chrono::milliseconds time) {
-    const TimeBudget deadline(time);
+                          const Credentials& credentials, std::chrono::milliseconds deadline) {
+    const TimeBudget budget(deadline);
     SambaCall call;
     call.arguments = {"ads", "dns", "register", "--machine-pass", "--", RegisteredName(membership)};
     call.arguments.insert(call.arguments.end(), addresses.begin(), addresses.end());
-    call.deadline = deadline.Left(time);
+    call.deadline = budget.Left(deadline);
     CommandResult result = RunNet(call);
-    if (!result.Succeeded() && !credentials.user.empty() && !deadline.Over()) {
+    if (!result.Succeeded() && !credentials.user.empty() && !budget.Over()) {
         call.arguments.erase(call.arguments.begin() + 3);
         call.credentials = &credentials;
-        call.deadline = deadline.Left(time);
+        call.deadline = budget.Left(deadline);
         result = RunNet(call);
     }
     return result.Succeeded() ? "" : LastWords(result);

@@ -156,7 +156,7 @@ private:
                 continue;
             }
             nt4Name_ = name;
-            const Controller controller = found.front();
+            const Controller& controller = found.front();
             steps_.Server(controller.address);
             steps_.Ok("NetBIOS names a primary domain controller of " + name);
             const ControllerInfo info = LookUp(controller.address);
@@ -383,7 +383,7 @@ void CheckRequest(const JoinRequest& request) {
         throw JoinError(status::kUnknownAccount, "no user name was given");
     }
     if (!IsToolAccountName(request.credentials.user)) {
-        throw JoinError("The user name begins with \"-\", or holds \"%\" or a control character, or is too long.");
+        throw JoinError(R"(The user name begins with "-", or holds "%" or a control character, or is too long.)");
     }
 }
 

@@ -82,7 +82,7 @@ Controller LeaveJob::FindController() {
 void LeaveJob::CheckCredentials(const Controller& controller) {
     const Credentials& credentials = request_.credentials;
     if (!IsToolAccountName(credentials.user)) {
-        Fail("The user name is empty, begins with \"-\", or holds \"%\" or a control character.");
+        Fail(R"(The user name is empty, begins with "-", or holds "%" or a control character.)");
     }
     TicketResult ticket;
     if (membership_.kind == DomainKind::ActiveDirectory &&

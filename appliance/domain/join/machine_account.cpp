@@ -7,6 +7,7 @@
 #include "appliance/domain/join/time_budget.h"
 #include "appliance/domain/join/tool_output.h"
 #include "appliance/domain/membership/discovery.h"
+#include "appliance/domain/membership/scratch_folder.h"
 
 namespace appliance {
 
@@ -62,8 +63,8 @@ std::string DeleteMachineAccount(const std::string& account, const std::string& 
 }
 
 SecretState TestSecret(const Membership& membership, const std::string& configuration, const std::string& controller,
-                       std::chrono::milliseconds time, std::string* words) {
-    const TimeBudget budget(time);
+                       std::chrono::milliseconds deadline, std::string* words) {
+    const TimeBudget budget(deadline);
     SambaCall call;
     call.configuration = configuration;
     if (membership.kind == DomainKind::ActiveDirectory) {
@@ -71,12 +72,17 @@ SecretState TestSecret(const Membership& membership, const std::string& configur
     } else {
         call.arguments = {"rpc", "testjoin"};
         // Left to itself, the tool looks for the controller of such a domain for ten seconds.
-        const std::string server = controller.empty() ? PrimaryController(membership, configuration, time) : controller;
+        const std::string server =
+            controller.empty() ? PrimaryController(membership, configuration, deadline) : controller;
         if (!server.empty()) {
             call.arguments.push_back("--server=" + server);
         }
     }
-    call.deadline = budget.Left(time);
+    const ScratchFolder memory;
+    if (!memory.path().empty()) {
+        call.arguments.push_back("--option=lock directory=" + memory.path());
+    }
+    call.deadline = budget.Left(deadline);
     const CommandResult result = RunNet(call);
     if (words != nullptr) {
         *words = LastWords(result);

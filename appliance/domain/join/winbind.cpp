@@ -44,9 +44,9 @@ std::string StopWinbind(milliseconds deadline) {
     return result ? "" : result.error;
 }
 
-std::string StartWinbind(milliseconds time) {
-    const TimeBudget budget(time);
-    const ServiceResult result = StartService(kService, time);
+std::string StartWinbind(milliseconds deadline) {
+    const TimeBudget budget(deadline);
+    const ServiceResult result = StartService(kService, deadline);
     if (!result) {
         return result.error;
     }
@@ -63,13 +63,13 @@ std::string StartWinbind(milliseconds time) {
     }
 }
 
-WinbindTrust ConfirmTrust(milliseconds time, std::string& words) {
-    const TimeBudget budget(time);
+WinbindTrust ConfirmTrust(milliseconds deadline, std::string& words) {
+    const TimeBudget budget(deadline);
     SambaCall call;
     call.arguments = {"--check-secret"};
     words = "not asked";
-    while (budget.Left(time) >= kLeastAttempt) {
-        call.deadline = budget.Left(time);
+    while (budget.Left(deadline) >= kLeastAttempt) {
+        call.deadline = budget.Left(deadline);
         const CommandResult result = RunWbinfo(call);
         if (result.Succeeded()) {
             return WinbindTrust::Confirmed;
@@ -78,7 +78,7 @@ WinbindTrust ConfirmTrust(milliseconds time, std::string& words) {
         if (result.end == CommandResult::End::TimedOut) {
             return WinbindTrust::Busy;
         }
-        std::this_thread::sleep_for(std::min(budget.Left(time), kLongPause));
+        std::this_thread::sleep_for(std::min(budget.Left(deadline), kLongPause));
     }
     return WinbindTrust::Denied;
 }

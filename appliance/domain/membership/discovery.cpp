@@ -158,11 +158,9 @@ struct Attempt {
 Attempt StartConnecting(const addrinfo& place) {
     Attempt attempt;
     attempt.socket.Reset(socket(place.ai_family, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
-    if (!attempt.socket) {
-        attempt.reason = std::generic_category().message(errno);
-    } else if (connect(attempt.socket.get(), place.ai_addr, place.ai_addrlen) == 0) {
+    if (attempt.socket && connect(attempt.socket.get(), place.ai_addr, place.ai_addrlen) == 0) {
         attempt.reason.clear();
-    } else if (errno == EINPROGRESS) {
+    } else if (attempt.socket && errno == EINPROGRESS) {
         attempt.pending = true;
     } else {
         attempt.reason = std::generic_category().message(errno);

@@ -73,7 +73,8 @@ Keytab OpenKeytab(krb5_context context, const std::string& path) {
 
 std::string WriteKerberosConfiguration(const std::string& folder, const std::string& realm, const std::string& kdc) {
     const std::string name = Upper(realm);
-    if (!IsDnsName(realm) || (!kdc.empty() && (HasControlBytes(kdc) || kdc.find_first_of(" {}#;") != kdc.npos))) {
+    if (!IsDnsName(realm) ||
+        (!kdc.empty() && (HasControlBytes(kdc) || kdc.find_first_of(" {}#;") != std::string::npos))) {
         throw std::system_error(EINVAL, std::generic_category(), "Kerberos configuration");
     }
     std::string text =

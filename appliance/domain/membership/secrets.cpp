@@ -96,7 +96,7 @@ bool WithinWait(const Attempt& attempt) {
     return true;
 }
 
-int CollectRecord(tdb_context*, TDB_DATA key, TDB_DATA value, void* records) {
+int CollectRecord(tdb_context* /*tdb*/, TDB_DATA key, TDB_DATA value, void* records) {
     std::string name(reinterpret_cast<const char*>(key.dptr), key.dsize);
     (*static_cast<Records*>(records))[name] = std::make_unique<Bytes>(value);
     return 0;
@@ -128,7 +128,7 @@ bool EndsWith(std::string_view text, const std::string& ending) {
 
 bool Owns(const SecretsOwner& owner, const std::string& recordKey) {
     // Some programs store keys with their NUL.
-    const std::string key = Upper(std::string(recordKey.c_str()));
+    const std::string key = Upper(recordKey.substr(0, recordKey.find('\0')));
     if (!owner.machine.empty() && key == "SECRETS/SID/" + Upper(owner.machine)) {
         return false;
     }

@@ -192,7 +192,7 @@ int VORNWinsSetSectionKey(const char* section, const char* key, const char* valu
     })
 }
 
-int VORNLDAPIsBinded(int) {
+int VORNLDAPIsBinded(int /*flags*/) {
     VORN_GUARD(0, {
         std::string text;
         if (appliance::ReadFile(Path(kNsswitch), text, kLargestNsswitch)) {
