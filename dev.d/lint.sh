@@ -10,7 +10,7 @@ usage() {
     cat <<'TEXT'
 usage: ./dev lint [FILE...]
 
-Examines the sources under src/, or the files, with clang-tidy and the rules of .clang-tidy.
+Examines the sources under src/ and appliance/, or the files, with clang-tidy and the rules of .clang-tidy.
 TEXT
 }
 

@@ -9,7 +9,7 @@ about_suite() {
         format) say "the C++ sources are formatted as .clang-format says" ;;
         shell) say "shellcheck finds nothing in the scripts" ;;
         clang) say "clang compiles the module without a warning" ;;
-        lint) say "clang-tidy finds nothing in src/" ;;
+        lint) say "clang-tidy finds nothing in src/ and appliance/" ;;
         unit) say "unit tests, with address and undefined-behaviour sanitizers" ;;
         corpus) say "the fuzzers' inputs as ordinary tests, with the same sanitizers" ;;
         sweep) say "every call of the appliance fails in every way, alone and in pairs, with the same sanitizers" ;;
@@ -97,7 +97,7 @@ suite_clang() {
 
 suite_lint() {
     configure_clang || return 1
-    cpp_files | grep '^src/.*\.cpp$' | check_files clang-tidy -p build/clang --quiet
+    cpp_files | grep -E '^(src|appliance)/.*\.cpp$' | check_files clang-tidy -p build/clang --quiet
 }
 
 # Everything that has a suite of its own is left out here, so that nothing is counted twice.
