@@ -53,7 +53,7 @@ bool AreNames(const Json::Value& groups) {
 
 }  // namespace
 
-class __attribute__((visibility("hidden"))) APIPolling::Impl {
+class APIPolling::Impl {
 public:
     TaskHost Host() const {
         return request != nullptr && request->impl->taskHost != nullptr ? *request->impl->taskHost

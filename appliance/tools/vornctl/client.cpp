@@ -41,7 +41,7 @@ Secret Body(const Json::Value& parameters, const Secret* password) {
         return Secret(text);
     }
     text.pop_back();  // the closing brace
-    text += parameters.empty() ? "\"password\":\"" : ",\"password\":\"";
+    text += parameters.empty() ? R"("password":")" : R"(,"password":")";
     const std::size_t size = text.size() + 6 * password->view().size() + 2;
     const std::unique_ptr<char[]> buffer(new char[size]);
     char* end = std::copy(text.begin(), text.end(), buffer.get());

@@ -1,5 +1,6 @@
 #include "appliance/tools/vornctl/schedule_words.h"
 
+#include <climits>
 #include <cstdio>
 #include <set>
 
@@ -43,13 +44,15 @@ std::string WeekName(const std::vector<std::string>& names) {
 }
 
 void SetTime(const std::string& text, Json::Value& request) {
-    int hour = -1;
-    int minute = -1;
-    int end = -1;
-    const bool read = text.size() <= 5 && std::sscanf(text.c_str(), "%2d:%2d%n", &hour, &minute, &end) == 2 &&
-                      end == static_cast<int>(text.size()) &&
-                      text.find_first_not_of("0123456789:") == std::string::npos;
-    if (!read || hour > 23 || minute > 59) {
+    const std::vector<std::string> parts = Split(text, ":");
+    const auto number = [](const std::string& digits) {
+        const bool plain =
+            !digits.empty() && digits.size() <= 2 && digits.find_first_not_of("0123456789") == std::string::npos;
+        return plain ? std::stoi(digits) : INT_MAX;
+    };
+    const int hour = number(parts.size() == 2 ? parts[0] : "");
+    const int minute = number(parts.size() == 2 ? parts[1] : "");
+    if (hour > 23 || minute > 59) {
         throw Failure(kUsage, "\"" + Escape(text) + "\" is no time of day: write it as 03:30.");
     }
     request["hour"] = hour;
