@@ -20,7 +20,8 @@ constexpr int kBacklog = 256;
 constexpr mode_t kSocketMode = 0666;
 
 StartError Failure(const std::string& path, int error) {
-    return StartError("socket " + path + ": " + std::strerror(error));
+    StartError failure("socket " + path + ": " + std::strerror(error));
+    return failure;
 }
 
 }  // namespace
