@@ -66,17 +66,41 @@ std::vector<std::string> PreferredServers(const Membership& membership) {
     throw DirectoryError(ErrorCode::Unreachable, "no domain controller of " + domain.name + " can be found");
 }
 
-// The controllers of the appliance's own domain are its Kerberos servers, too; for another domain those of its own one
-// are found in DNS, unless the administrator has named some.
-std::string PrepareKerberos(const FetchDomain& domain, const Membership& membership, const Controller& controller) {
-    std::string kdc = domain.own ? controller.address : "";
-    if (!domain.own) {
-        for (const std::string& server : PreferredServers(membership)) {
-            std::string reason;
-            if (kdc.empty() && CanConnect(server, kKerberosPort, kConnectTime, reason)) {
-                kdc = server;
-            }
+// The Kerberos servers to try: the controllers of the appliance's own domain. Those that the administrator has named, or
+// else those that DNS knows.
+std::vector<std::string> KerberosServers(const FetchDomain& domain, const Membership& membership,
+                                         const Controller& controller) {
+    if (domain.own) {
+        return {controller.address};
+    }
+    std::vector<std::string> servers = PreferredServers(membership);
+    if (servers.empty()) {
+        for (const Controller& found : FindControllers(Lower(membership.realm), kDiscoveryTime)) {
+            servers.push_back(found.address);
         }
+    }
+    if (servers.size() > kMostControllers) {
+        servers.resize(kMostControllers);
+    }
+    return servers;
+}
+
+// The Kerberos library tries a silent server for a quarter of a minute, so one that answers is named to it. Answers the
+// configuration; `reason` says why no server answers, and is empty when one does.
+std::string PrepareKerberos(const FetchDomain& domain, const Membership& membership, const Controller& controller,
+                            std::string& reason) {
+    const std::vector<std::string> servers = KerberosServers(domain, membership, controller);
+    std::string kdc;
+    std::string reasons;
+    for (const std::string& server : servers) {
+        if (CanConnect(server, kKerberosPort, kConnectTime, reason)) {
+            kdc = server;
+            break;
+        }
+        reasons += (reasons.empty() ? "" : "; ") + server + ": port 88: " + reason;
+    }
+    if (kdc.empty()) {
+        reason = servers.empty() ? "no Kerberos server of " + membership.realm + " can be found" : reasons;
     }
     const std::string folder = Path(kRun) + "/kerberos";
     if (const std::error_code error = MakeFolder(folder, 0755)) {
@@ -156,7 +180,14 @@ std::unique_ptr<LdapSession> OpenSession(const FetchDomain& domain, const Member
             continue;
         }
         if (!hasTicket) {
-            UseKerberosConfiguration(PrepareKerberos(domain, membership, candidate));
+            UseKerberosConfiguration(PrepareKerberos(domain, membership, candidate, reason));
+            if (!reason.empty()) {
+                reasons.Add(ErrorCode::Unreachable, reason);
+                if (domain.own) {
+                    continue;
+                }
+                break;  // the servers are the same for each controller of another domain
+            }
             reason = TakeMachineTicket(membership.Account(), membership.realm);
             if (!reason.empty()) {
                 throw DirectoryError(ErrorCode::Refused,
@@ -217,7 +248,8 @@ std::string FetchByRpc(EntryKind kind, const FetchDomain& domain, const Membersh
         call.arguments = {"-P", "-c", RpcQuestion(kind, domain), domain.dns.empty() ? candidate.address : shown};
         call.deadline = kAnswerTime;
         if (membership.kind == DomainKind::ActiveDirectory) {
-            call.kerberosConfiguration = PrepareKerberos(domain, membership, candidate);
+            // Without a Kerberos server the tool has another way to log in.
+            call.kerberosConfiguration = PrepareKerberos(domain, membership, candidate, reason);
         }
         RpcParser parser;
         const CommandResult result = RunLines(SambaCommand(kRpcclient, call), [&](const std::string& line) {

@@ -174,12 +174,17 @@ TicketResult AskForTicket(const Credentials& credentials, const std::string& rea
                           const std::string& configuration, milliseconds deadline) {
     TicketResult result;
     Answer answer{};
+    const TimeBudget budget(deadline);
     if (AskInChild(TakeApart(credentials.user, realm, domain), credentials.password.c_str(), configuration, deadline,
                    answer)) {
         answer.words.back() = '\0';
         result.outcome = OutcomeOf(answer.code);
         result.words = answer.words.data();
         result.clockDifference = answer.clockDifference;
+    } else if (budget.Over()) {
+        // The library itself would go on for a quarter of a minute and then say this.
+        result.outcome = Outcome::Unreachable;
+        result.words = "Cannot contact any KDC for realm '" + realm + "'";
     }
     return result;
 }

@@ -18,9 +18,9 @@ struct TicketResult {
         UnknownAccount,
         Revoked,  // disabled, locked or expired: the protocol does not say which
         PasswordExpired,
-        Unreachable,  // no KDC answers, or the realm is unknown
+        Unreachable,  // no KDC answers in time, or the realm is unknown
         Failed,       // anything else
-        NotAsked,     // no process could be started, or the deadline passed
+        NotAsked,     // no process could be started
     };
     Outcome outcome = Outcome::NotAsked;
     std::string words;         // the library's own, in one line

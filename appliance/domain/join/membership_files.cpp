@@ -195,8 +195,10 @@ std::vector<std::string> PutBack(const Journal& journal) {
     return failures;
 }
 
-void PrepareLeave(const Journal& journal, const std::string& workgroup) {
-    MakeJournalFolder();
+namespace {
+
+// The journal itself comes last: until then a join's is still true, which needs none of these on the way back.
+void WriteLeave(const Journal& journal, const std::string& workgroup) {
     const std::string old = Read(Path(kSmbConf));
     FormerKeys former;
     if (Exists(journal::FormerKeysFile())) {
@@ -209,6 +211,24 @@ void PrepareLeave(const Journal& journal, const std::string& workgroup) {
     Check(ReplaceFile(journal::OldConf(), old), journal::OldConf());
     Check(ReplaceFile(journal::NewConf(), conf.text()), journal::NewConf());
     WriteJournal(journal);
+}
+
+}  // namespace
+
+void PrepareLeave(const Journal& journal, const std::string& workgroup) {
+    MakeJournalFolder();
+    WriteLeave(journal, workgroup);
+}
+
+Journal TurnIntoLeave(const Journal& journal, const std::string& workgroup) {
+    Journal leave;
+    leave.phase = Journal::Phase::Leaving;
+    leave.before = journal.before;
+    leave.after = journal.before;
+    leave.after.kind = DomainKind::Workgroup;
+    leave.after.domain = workgroup;
+    WriteLeave(leave, workgroup);
+    return leave;
 }
 
 std::vector<std::string> ClearMembership(const Journal& journal) {

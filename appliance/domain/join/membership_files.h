@@ -33,6 +33,10 @@ std::vector<std::string> PutBack(const Journal& journal);
 // Makes the new configuration of a leave and writes the journal. Throws std::system_error, JoinError.
 void PrepareLeave(const Journal& journal, const std::string& workgroup);
 
+// Turns the journal of an interrupted join into that of a leave of the old membership, and answers it. Throws
+// std::system_error, JoinError.
+Journal TurnIntoLeave(const Journal& journal, const std::string& workgroup);
+
 // Removes the traces of the membership `journal.before`: configuration first (throws std::system_error when that fails,
 // with nothing changed), then secrets, keytab, caches. Answers what could not be removed. winbindd must not run.
 std::vector<std::string> ClearMembership(const Journal& journal);

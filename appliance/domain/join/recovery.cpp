@@ -16,9 +16,11 @@
 #include "appliance/domain/join/machine_account.h"
 #include "appliance/domain/join/membership_files.h"
 #include "appliance/domain/join/provisional.h"
+#include "appliance/domain/join/step_log.h"
 #include "appliance/domain/join/time_budget.h"
 #include "appliance/domain/join/winbind.h"
 #include "appliance/domain/membership/secrets.h"
+#include "appliance/platform/system/services.h"
 
 namespace appliance {
 
@@ -32,11 +34,13 @@ constexpr milliseconds kTestWait{2500};
 constexpr milliseconds kToolWait{2000};
 constexpr milliseconds kLongestToolWait{20000};
 constexpr milliseconds kWinbindWait{4000};
+constexpr milliseconds kReloadWait{2000};
 constexpr milliseconds kStartWait{2000};
 constexpr milliseconds kBackgroundTime{600000};
 constexpr milliseconds kBackgroundPatience{8000};
 constexpr milliseconds kFirstPause{500};
 constexpr milliseconds kLongestPause{15000};
+constexpr char kWorkgroup[] = "WORKGROUP";  // the one that a leave leads to
 constexpr char kRecoveryLock[] = "/run/vorn/join_recovery.lock";
 
 class Recoverer {
@@ -90,7 +94,10 @@ private:
         if (SameMachineSecret(Path(kSecrets), journal::StagedSecrets(), domain)) {
             // Killed, or with the whole machine gone, the tool may have changed the password without storing it.
             const bool dead = TestSecret(journal.before, "", "", budget_.Left(kTestWait)) == SecretState::Refused;
-            Note(Unfinished(journal) + (dead ? NeitherSecret(journal) : "the membership is the old one"));
+            if (dead) {
+                return GiveUpSecrets(journal);
+            }
+            Note(Unfinished(journal) + "the membership is the old one");
             return;
         }
         if (journal.phase != Phase::Joined) {
@@ -111,13 +118,28 @@ private:
                 return;
             }
             if (staged == SecretState::Refused) {
-                Note(Unfinished(journal) + NeitherSecret(journal));
-                return;
+                return GiveUpSecrets(journal);
             }
         }
         AdoptStagedSecret(journal);
         RestartWinbind(journal.before);
         Note(Unfinished(journal) + "its new secret was put in place under the old configuration");
+    }
+
+    // Without a secret that works there is no membership any more, and one that says so is better than one that pretends.
+    // A job that has failed, though, leaves the configuration as it was.
+    void GiveUpSecrets(const Journal& journal) {
+        Note(Unfinished(journal) + "the controller accepts no stored secret of " + journal.after.Account() +
+             ": join again");
+        if (wanted_ == Wanted::Old) {
+            return;
+        }
+        Complain(StopWinbind(kWinbindWait));
+        for (const std::string& failure : ClearMembership(TurnIntoLeave(journal, kWorkgroup))) {
+            Note("could not be removed: " + failure);
+        }
+        ReloadServices();
+        Note("the appliance is in its workgroup " + std::string(kWorkgroup));
     }
 
     // Another account than the appliance's own was joined, so the old membership, if any, is untouched.
@@ -131,6 +153,10 @@ private:
         Note(Unfinished(journal) + (journal.before.DomainMode()
                                         ? "the membership of " + journal.before.domain + " is the old one"
                                         : "the appliance is in its workgroup " + journal.before.domain));
+        if (journal.before.Joined()) {
+            // It may have been stopped already.
+            Complain(StartWinbind(budget_.Left(kWinbindWait)));
+        }
         if (!journal.accountExisted) {
             Note("the computer account " + journal.after.Account() + " may have been created in " +
                  journal.after.domain + " and stays there");
@@ -147,6 +173,7 @@ private:
         Complain(StartWinbind(budget_.Left(kWinbindWait)));
         Complain(RecordDnsServers());
         KeepProvisionalChanges();
+        ReloadServices();
         recovery_.completed = true;
         Note(Unfinished(journal) + "it was completed");
     }
@@ -154,6 +181,7 @@ private:
     void Close(const Journal& journal) {
         Complain(RecordDnsServers());
         KeepProvisionalChanges();
+        ReloadServices();
         recovery_.completed = true;
         Note(Unfinished(journal) + "the new membership is in place; its addresses may not be registered in DNS");
     }
@@ -176,9 +204,17 @@ private:
         for (const std::string& failure : ClearMembership(journal)) {
             Note("could not be removed: " + failure);
         }
+        ReloadServices();
         recovery_.completed = true;
         Note("an interrupted leave of " + journal.before.domain + " was completed; the computer account " +
              journal.before.Account() + " may still be there");
+    }
+
+    // Whoever asked for the change is not there to do it.
+    void ReloadServices() {
+        for (const char* service : {"samba", "nmbd"}) {
+            Complain(ReloadService(service, kReloadWait).error);
+        }
     }
 
     void RestartWinbind(const Membership& membership) {
@@ -186,10 +222,6 @@ private:
             Complain(StopWinbind(kWinbindWait));
             Complain(StartWinbind(budget_.Left(kWinbindWait)));
         }
-    }
-
-    static std::string NeitherSecret(const Journal& journal) {
-        return "the controller accepts no stored secret of " + journal.after.Account() + ": join again";
     }
 
     static std::string Unfinished(const Journal& journal) {
@@ -250,6 +282,9 @@ Recovery RecoverAndName(milliseconds patience, Wanted wanted, std::time_t before
                 recovery.notes.push_back(change);
             }
         }
+        if (recovery.result == Result::Nothing || recovery.result == Result::Done) {
+            EndInterruptedSteps(recovery.completed, recovery.notes);
+        }
         return recovery;
     } catch (const std::exception& error) {
         Log(LOG_ERR, std::string("an interrupted join could not be put right: ") + error.what());
@@ -299,7 +334,11 @@ void RecoverWhenPossible(Wanted wanted) {
         std::this_thread::sleep_for(all.Left(pause));
         pause = std::min(pause * 2, kLongestPause);
     }
-    Log(LOG_ERR, "an interrupted join could not be put right yet; the next start or join tries again");
+    const std::string text = "an interrupted join could not be put right yet; the next start or join tries again";
+    Log(LOG_ERR, text);
+    if (const std::optional<FileLock> lock = FileLock::Take(Path(kJoinLock), milliseconds(0))) {
+        EndInterruptedSteps(false, {text});
+    }
 }
 
 }  // namespace appliance

@@ -4,17 +4,40 @@
 #include <unistd.h>
 
 #include <ctime>
+#include <memory>
 
 #include "appliance/base/file.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
+#include "appliance/domain/membership/membership.h"
 
 namespace appliance {
 
 namespace {
 
 constexpr char kRunning[] = "running";
+constexpr char kInterrupted[] = "interrupted";
 constexpr mode_t kMode = 0600;
+constexpr std::size_t kLargestRecord = 1 << 20;
+
+std::error_code WriteRecord(const Json::Value& record) {
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    return ReplaceFile(Path(kJoinSteps), Json::writeString(builder, record) + "\n", kMode);
+}
+
+// The record that stands there; null when there is none, or no such thing.
+Json::Value ReadRecord() {
+    std::string text;
+    Json::Value record;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    if (ReadFile(Path(kJoinSteps), text, kLargestRecord) ||
+        !reader->parse(text.data(), text.data() + text.size(), &record, nullptr) || !record.isObject() ||
+        !record["steps"].isArray() || !record["leftovers"].isArray() || !record["action"].isString()) {
+        return {};
+    }
+    return record;
+}
 
 }  // namespace
 
@@ -114,11 +137,34 @@ void StepLog::Write() {
     record["message"] = message_;
     record["steps"] = steps;
     record["leftovers"] = leftovers;
-    Json::StreamWriterBuilder builder;
-    builder["indentation"] = "";
-    if (const std::error_code error = ReplaceFile(Path(kJoinSteps), Json::writeString(builder, record) + "\n", kMode);
-        error && !complained_) {
+    if (const std::error_code error = WriteRecord(record); error && !complained_) {
         complained_ = true;
+        Log(LOG_WARNING, Path(kJoinSteps) + ": " + error.message());
+    }
+}
+
+void EndInterruptedSteps(bool completed, const std::vector<std::string>& notes) {
+    Json::Value record = ReadRecord();
+    if (record.isNull() || !record["finished"].isNull()) {
+        return;
+    }
+    for (Json::Value& step : record["steps"]) {
+        if (step.isObject() && step["outcome"] == kRunning) {
+            step["outcome"] = "failed";
+            step["detail"] = kInterrupted;
+        }
+    }
+    for (const std::string& note : notes) {
+        record["leftovers"].append(note);
+    }
+    // A leave has a last step that no membership depends on.
+    Membership membership;
+    const bool left = record["action"] == "leave" && !ReadMembership(membership) && !membership.DomainMode();
+    const bool success = completed || left;
+    record["success"] = success;
+    record["message"] = success ? "" : "The " + record["action"].asString() + " was interrupted.";
+    record["finished"] = Json::Int64{std::time(nullptr)};
+    if (const std::error_code error = WriteRecord(record)) {
         Log(LOG_WARNING, Path(kJoinSteps) + ": " + error.message());
     }
 }

@@ -64,6 +64,11 @@ private:
     std::chrono::steady_clock::time_point stepBegan_;
 };
 
+// Ends the record of a job whose process was killed: the step that was running has failed, `completed` tells whether the
+// job was done to its end since then, and `notes` what was done about it. Nothing when the record has its end. Only for
+// the holder of the join lock, which the job would have.
+void EndInterruptedSteps(bool completed, const std::vector<std::string>& notes);
+
 }  // namespace appliance
 
 #endif

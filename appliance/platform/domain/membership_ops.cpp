@@ -22,7 +22,7 @@ using appliance::DomainKind;
 using appliance::Membership;
 using appliance::Path;
 
-constexpr std::chrono::milliseconds kTestDeadline{10000};
+constexpr std::chrono::milliseconds kTestDeadline{12000};
 constexpr std::chrono::milliseconds kLockWait{5000};
 constexpr char kNsswitch[] = "/etc/nsswitch.conf";
 constexpr std::size_t kLargestNsswitch = 1 << 20;

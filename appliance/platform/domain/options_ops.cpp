@@ -7,7 +7,14 @@
 #include "appliance/base/paths.h"
 #include "appliance/domain/directory/admin_group.h"
 #include "appliance/domain/directory/home_include.h"
+#include "appliance/platform/domain/vornwin_start.h"
 #include "appliance/platform/last_error.h"
+
+namespace {
+
+constexpr std::chrono::milliseconds kAdministratorsTime{4000};  // a client waits, and little is left of a join's time
+
+}  // namespace
 
 extern "C" {
 
@@ -18,7 +25,10 @@ int VORNGroupAddDomainAdminGroup(void) {
             return VORN_FAIL(FileRead);
         }
         appliance::ErrorCode code = appliance::ErrorCode::Internal;
-        if (!appliance::ApplyDomainAdministrators(membership, code)) {
+        if (!appliance::ApplyDomainAdministrators(membership, kAdministratorsTime, code)) {
+            if (code == appliance::ErrorCode::TimedOut) {
+                appliance::StartVornwin("-domainAdmins");
+            }
             VLIBCErrSetEx(static_cast<int>(code), appliance::SourceName(__FILE__), __LINE__);
             return -1;
         }

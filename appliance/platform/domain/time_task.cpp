@@ -2,19 +2,14 @@
 //
 #include "appliance/platform/domain/time_task.h"
 
-#include <fcntl.h>
 #include <json/value.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <array>
-#include <cerrno>
-#include <csignal>
 #include <cstring>
 #include <memory>
 
-#include "appliance/base/paths.h"
 #include "appliance/domain/directory/time_sync.h"
+#include "appliance/platform/domain/vornwin_start.h"
 #include "appliance/platform/last_error.h"
 
 namespace appliance {
@@ -101,35 +96,6 @@ int RemoveTask() {
     }
 }
 
-// Starts vornwin in a session of its own. Its parent ends at once, so that nobody has to collect it.
-void StartSynchronisation() {
-    const std::string program = Path(kVornwin);
-    const pid_t pid = fork();
-    if (pid < 0) {
-        Log(LOG_ERR, std::string("time synchronisation can't be started: ") + strerror(errno));
-        return;
-    }
-    if (pid == 0) {
-        // Between fork and exec nothing is called that could wait for another thread.
-        if (fork() != 0) {
-            _exit(0);
-        }
-        setsid();
-        const int nothing = open("/dev/null", O_RDWR);
-        dup2(nothing, 0);
-        dup2(nothing, 1);
-        dup2(nothing, 2);
-        signal(SIGPIPE, SIG_DFL);
-        sigset_t none;
-        sigemptyset(&none);
-        sigprocmask(SIG_SETMASK, &none, nullptr);
-        execl(program.c_str(), program.c_str(), kSyncOption, static_cast<char*>(nullptr));
-        _exit(127);
-    }
-    while (waitpid(pid, nullptr, 0) < 0 && errno == EINTR) {
-    }
-}
-
 }  // namespace
 
 int ApplyTimeSynchronisation() {
@@ -137,7 +103,7 @@ int ApplyTimeSynchronisation() {
         return RemoveTask();
     }
     const int result = MakeTask();
-    StartSynchronisation();
+    StartVornwin(kSyncOption);
     return result;
 }
 

@@ -111,8 +111,20 @@ std::optional<ErrorCode> BringBack(const Content& before) {
     return std::nullopt;
 }
 
-// The copy first: a file that was changed must be one that can be brought back.
-std::optional<ErrorCode> Change(const Content& before, const std::vector<std::string>& servers) {
+// The copy as it was before a change that failed.
+void BringBackCopy(const Content& before, const Content& current) {
+    const std::error_code error = before == current
+                                      ? RemoveFile(Path(kResolvCopy))
+                                      : ReplaceFile(Path(kResolvCopy), Format({before, TextOf(current)}), 0600);
+    if (error) {
+        Log(LOG_WARNING, "DNS servers: " + Path(kResolvCopy) + ": " + error.message());
+    }
+}
+
+// The copy first: a file that was changed must be one that can be brought back. `before` is what that would be, which is
+// `current` unless it was changed already.
+std::optional<ErrorCode> Change(const Content& before, const Content& current,
+                                const std::vector<std::string>& servers) {
     const Copy copy = {before, WithServers(TextOf(before), servers)};
     if (const std::error_code error = MakeFolder(Path(kPrivate), 0700)) {
         return WriteFailure(Path(kPrivate), error);
@@ -121,6 +133,7 @@ std::optional<ErrorCode> Change(const Content& before, const std::vector<std::st
         return WriteFailure(Path(kResolvCopy), error);
     }
     if (const std::error_code error = ReplaceFile(Path(kResolvConf), copy.after, kFileMode)) {
+        BringBackCopy(before, current);
         return WriteFailure(Path(kResolvConf), error);
     }
     return std::nullopt;
@@ -164,7 +177,7 @@ std::optional<ErrorCode> WriteDnsServers(const std::vector<std::string>& entries
     if (copy && *servers == Servers(TextOf(copy->before))) {
         return BringBack(copy->before);
     }
-    return Change(copy ? copy->before : current, *servers);
+    return Change(copy ? copy->before : current, current, *servers);
 }
 
 }  // namespace appliance

@@ -136,9 +136,13 @@ bool APIPolling::Start(APIResponse* response, APITaskFunction body, void* userDa
         task.parameters = impl->request->impl->parameters;
         const std::string id = impl->Store().Add(task);
         const std::string reason = appliance::StartTaskProcess(impl->Host(), id, kStartLimit);
-        if (!reason.empty()) {
+        const std::optional<TaskRecord> left = reason.empty() ? std::nullopt : impl->Store().Find(id);
+        // One that somebody has stopped before it began was started all the same: its status says what became of it.
+        const bool stopped =
+            left && (left->state == TaskState::Stopping ||
+                     (left->state == TaskState::Ended && left->code == static_cast<int>(FrameworkCode::TaskStopped)));
+        if (!reason.empty() && !stopped) {
             appliance::Log(LOG_ERR, "background task " + id + ": " + reason);
-            const std::optional<TaskRecord> left = impl->Store().Find(id);
             if (left && left->state == TaskState::Running) {
                 appliance::EndSession(left->process, true, kStopPatience);
             }

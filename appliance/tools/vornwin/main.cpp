@@ -7,6 +7,7 @@
 #include <string>
 
 #include "appliance/base/log.h"
+#include "appliance/domain/directory/admin_group.h"
 #include "appliance/domain/directory/home_include.h"
 #include "appliance/domain/directory/time_sync.h"
 #include "appliance/tools/vornwin/update_domain.h"
@@ -14,12 +15,14 @@
 namespace {
 
 constexpr char kHelp[] =
-    "usage: vornwin -updateDomain | -syncTime | --help\n"
+    "usage: vornwin -updateDomain | -syncTime | -domainAdmins | --help\n"
     "\n"
     "  -updateDomain  refresh the lists of domain users and groups of all domains in sight\n"
     "                 (of the own one only when trusted domains are disabled)\n"
     "  -syncTime      set the clock by the domain controller's; a difference of more than a day is\n"
     "                 reported and not followed\n"
+    "  -domainAdmins  make the domain's administrators administrators here, or not, as the options say;\n"
+    "                 tries again for minutes while winbind is busy\n"
     "  --help         this text\n"
     "\n"
     "The file-sharing service also calls \"vornwin -makeHome -- USER\" to make a domain user's home folder.\n"
@@ -48,6 +51,9 @@ int Run(int count, char** arguments) {
     }
     if (count == 2 && command == "-syncTime") {
         return appliance::SynchroniseTime() ? appliance::kDone : appliance::kFailed;
+    }
+    if (count == 2 && command == "-domainAdmins") {
+        return appliance::ApplyDomainAdministratorsLater() ? appliance::kDone : appliance::kFailed;
     }
     if (count == 4 && command == "-makeHome" && strcmp(arguments[2], "--") == 0) {
         return MakeHome(arguments[3]);

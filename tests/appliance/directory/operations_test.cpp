@@ -252,15 +252,29 @@ TEST_F(OperationsTest, TellsThatAdministratorsCannotBeChanged) {
     EXPECT_EQ(LastError(), ErrorCode::NotMember);
 }
 
-class TimeTaskTest : public OperationsTest {
+class StartTest : public OperationsTest {
 protected:
-    TimeTaskTest() {
+    StartTest() {
         for (const char* path : {"/usr/vorn/sbin", "/etc/cron.d"}) {
             mkdir(Path(path).c_str(), 0755);
         }
         Put(Path(appliance::kVornwin), "#!/bin/sh\necho \"$*\" >> '" + folder / "started" + "'\n");
         chmod(Path(appliance::kVornwin).c_str(), 0755);
     }
+};
+
+TEST_F(StartTest, AdministratorsAreChangedLaterWhileWinbindIsBusy) {
+    PutAnswer("net", "", 255);
+    EXPECT_EQ(VORNGroupAddDomainAdminGroup(), -1);
+    EXPECT_EQ(Got(folder / "started"), "<missing>");
+    PutProgram("net", "sleep 30");
+    EXPECT_EQ(VORNGroupAddDomainAdminGroup(), -1);
+    EXPECT_EQ(LastError(), ErrorCode::TimedOut);
+    EXPECT_TRUE(Eventually([this] { return Got(folder / "started") == "-domainAdmins\n"; }));
+}
+
+class TimeTaskTest : public StartTest {
+protected:
     static void Switch(const std::string& value) {
         Put(Path(appliance::kSmbConf), "[global]\n    workgroup = LAB\n    vorn sync dctime = " + value + "\n");
     }

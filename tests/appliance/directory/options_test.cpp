@@ -12,6 +12,7 @@ using appliance::ErrorCode;
 using appliance::ParseDomainSid;
 using appliance::ParseTime;
 
+constexpr std::chrono::seconds kPatience{20};
 constexpr char kSids[] =
     "SID for local machine NAS1 is: S-1-5-21-2872217150-2617190287-591229512\n"
     "SID for domain LAB is: S-1-5-21-1199070361-2413314540-1962081955\n";
@@ -40,7 +41,7 @@ protected:
     }
     bool Apply() {
         Put(folder / "asked", "");
-        return appliance::ApplyDomainAdministrators(membership, code);
+        return appliance::ApplyDomainAdministrators(membership, kPatience, code);
     }
 
     appliance::Membership membership;
@@ -82,6 +83,14 @@ TEST_F(AdminGroupTest, SaysWhenItCannot) {
     EXPECT_FALSE(Apply());
     EXPECT_EQ(code, ErrorCode::NotMember);
     EXPECT_EQ(Got(folder / "asked"), "");
+}
+
+TEST_F(AdminGroupTest, GivesUpInTimeWhileWinbindIsBusy) {
+    PutNet("sleep 20");
+    const auto began = std::chrono::steady_clock::now();
+    EXPECT_FALSE(appliance::ApplyDomainAdministrators(membership, std::chrono::seconds(1), code));
+    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(10));
+    EXPECT_EQ(code, ErrorCode::TimedOut);
 }
 
 TEST(ClockTest, ReadsWhatNetTimePrints) {

@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <thread>
 
 #include "appliance/base/error_code.h"
@@ -139,6 +140,28 @@ TEST_F(Operations, TheTestIsTheControllersWord) {
     Tool("/usr/bin/net", "echo \"Join to 'LAB' is OK\"");
     EXPECT_EQ(VORNWinTestJoin(0), 0);
     EXPECT_THAT(Calls().back(), HasSubstr("rpc testjoin"));
+}
+
+TEST_F(Operations, AControllerThatIsBackIsAskedThoughSambaLeavesItAlone) {
+    MakeMember("ads", "LAB", "LAB.TEST");
+    Tool("/usr/bin/net",
+         "for word; do case $word in *'lock directory='*) test -d \"${word#*directory=}\" && "
+         "test -z \"$(ls \"${word#*directory=}\")\" && touch \"${word#*directory=}/known\" && "
+         "echo Join is OK && exit;; esac; done; echo No logon servers >&2; exit 255");
+    EXPECT_EQ(VORNWinTestJoin(1), 0);
+    EXPECT_EQ(Calls().size(), 2U);
+    EXPECT_THAT(Calls()[0], Not(HasSubstr("lock directory")));
+    EXPECT_EQ(VORNWinTestJoin(1), 0);
+    for (const auto& entry : std::filesystem::directory_iterator(appliance::Path(appliance::kRun))) {
+        EXPECT_THAT(entry.path().filename().string(), Not(HasSubstr("samba-call")));
+    }
+}
+
+TEST_F(Operations, ARefusalIsNotAskedForTwice) {
+    MakeMember("ads", "LAB", "LAB.TEST");
+    Tool("/usr/bin/net", "echo Preauthentication failed >&2; exit 255");
+    EXPECT_EQ(VORNWinTestJoin(1), -1);
+    EXPECT_EQ(Calls().size(), 1U);
 }
 
 TEST_F(Operations, AHangingControllerDoesNotHoldUpTheTestForEver) {

@@ -119,6 +119,41 @@ TEST_F(RecoveryTest, WithoutAJournalThereIsNothingToDo) {
     EXPECT_THAT(Calls(), IsEmpty());
 }
 
+constexpr char kOpenRecord[] =
+    R"({"id":"1-2","action":"join","domain":"LAB","started":1,"finished":null,"success":null,"message":"",)"
+    R"("steps":[{"name":"request","outcome":"ok"},{"name":"join","outcome":"running"}],"leftovers":[]})";
+
+TEST_F(RecoveryTest, TheRecordOfAKilledJoinGetsItsEnd) {
+    Put(appliance::kJoinSteps, kOpenRecord);
+    EXPECT_EQ(appliance::RecoverInterruptedJoin().result, Result::Nothing);
+    const std::string record = Content(appliance::kJoinSteps);
+    EXPECT_THAT(record, HasSubstr("\"success\":false"));
+    EXPECT_THAT(record, HasSubstr("The join was interrupted."));
+    EXPECT_THAT(record, HasSubstr("\"outcome\":\"ok\""));
+    EXPECT_THAT(record, HasSubstr("\"outcome\":\"failed\""));
+    EXPECT_THAT(record, Not(HasSubstr("null")));
+    EXPECT_THAT(record, Not(HasSubstr("running")));
+}
+
+TEST_F(RecoveryTest, TheRecordOfACompletedJoinSaysSo) {
+    Interrupt(Phase::Swapping, "");
+    Put(appliance::kJoinSteps, kOpenRecord);
+    Answers(kOk, kOk);
+    ASSERT_TRUE(appliance::RecoverInterruptedJoin().completed);
+    const std::string record = Content(appliance::kJoinSteps);
+    EXPECT_THAT(record, HasSubstr("\"success\":true"));
+    EXPECT_THAT(record, HasSubstr("it was completed"));
+}
+
+TEST_F(RecoveryTest, ARecordWithAnEndIsLeftAlone) {
+    const std::string record = R"({"action":"join","finished":2,"success":true,"steps":[],"leftovers":[]})";
+    for (const std::string& text : {record, std::string("no JSON"), std::string()}) {
+        Put(appliance::kJoinSteps, text);
+        appliance::RecoverInterruptedJoin();
+        EXPECT_EQ(Content(appliance::kJoinSteps), text);
+    }
+}
+
 TEST_F(RecoveryTest, WhatAJoinLeftBeforeItsJournalGoes) {
     Put("/usr/vorn/etc/private/join/old.secrets.tdb", "secret");
     Put("/usr/vorn/etc/private/join/staging/secrets.tdb", "secret");
@@ -169,10 +204,29 @@ TEST_F(RecoveryTest, TheOwnAccountJoinedAgainAndTheNewSecretWorks) {
     ExpectOldOne();
 }
 
+// Killed between the change of the password on the controller and its storage here.
 TEST_F(RecoveryTest, TheOwnAccountJoinedAgainAndNeitherWorks) {
+    for (const bool stored : {true, false}) {
+        Interrupt(Phase::Joining, "LAB", stored);
+        Answers(kRefused, kRefused);
+        const Recovery recovery = appliance::RecoverInterruptedJoin();
+        EXPECT_EQ(recovery.result, Result::Done);
+        EXPECT_FALSE(recovery.completed);
+        EXPECT_THAT(recovery.notes, testing::Contains(HasSubstr("accepts no stored secret")));
+        appliance::Membership membership;
+        ASSERT_FALSE(appliance::ReadMembership(membership));
+        EXPECT_FALSE(membership.DomainMode());
+        EXPECT_EQ(membership.domain, "WORKGROUP");
+        EXPECT_EQ(Password("LAB"), "<none>");
+        EXPECT_THAT(Content(appliance::kSmbConf), Not(HasSubstr("LAB")));
+        ExpectNothingLeft();
+    }
+}
+
+TEST_F(RecoveryTest, AFailedJoinLeavesTheConfigurationAlsoWhenNeitherSecretWorks) {
     Interrupt(Phase::Joining, "LAB");
     Answers(kRefused, kRefused);
-    const Recovery recovery = appliance::RecoverInterruptedJoin();
+    const Recovery recovery = appliance::RecoverOnce(kPatience, Wanted::Old);
     EXPECT_EQ(recovery.result, Result::Done);
     EXPECT_THAT(recovery.notes, ElementsAre(HasSubstr("accepts no stored secret")));
     EXPECT_EQ(Password("LAB"), "old");
@@ -216,6 +270,8 @@ TEST_F(RecoveryTest, AMemberOfAnotherDomainStaysIt) {
         const Recovery recovery = appliance::RecoverInterruptedJoin();
         EXPECT_EQ(recovery.result, Result::Done);
         EXPECT_THAT(recovery.notes, testing::Contains(HasSubstr("NAS1$")));
+        // The join may have stopped it.
+        EXPECT_TRUE(Exists("/run/samba/winbindd.pid"));
         EXPECT_EQ(Password("CORP"), "old");
         EXPECT_EQ(Password("LAB"), "<none>");
         EXPECT_EQ(Content("/etc/krb5.keytab"), "old keytab");

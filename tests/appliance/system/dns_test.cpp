@@ -254,6 +254,28 @@ TEST_F(DnsServers, FailWhereTheFileCantBeReadOrWritten) {
     EXPECT_EQ(VLIBCErrGet(), static_cast<int>(appliance::ErrorCode::FileWrite));
 }
 
+// The folder can be written, but nothing fits in beside a name this long.
+TEST_F(DnsServers, LeaveNoCopyOfAFileThatCouldNotBeChanged) {
+    const std::string longest = "/etc/" + std::string(250, 'x');
+    Put(longest, "nameserver 10.0.0.1\n");
+    ASSERT_EQ(symlink(std::string(250, 'x').c_str(), At(kFile).c_str()), 0);
+    EXPECT_EQ(Set({"192.0.2.1"}), -1);
+    EXPECT_FALSE(Content(appliance::kResolvCopy));
+    EXPECT_EQ(*Content(longest), "nameserver 10.0.0.1\n");
+}
+
+TEST_F(DnsServers, ComeBackAlsoAfterAChangeThatFailed) {
+    const std::string longest = "/etc/" + std::string(250, 'x');
+    Put(kFile, "nameserver 10.0.0.1");
+    ASSERT_EQ(Set({"192.0.2.1"}), 0);
+    ASSERT_EQ(rename(At(kFile).c_str(), At(longest).c_str()), 0);
+    ASSERT_EQ(symlink(std::string(250, 'x').c_str(), At(kFile).c_str()), 0);
+    EXPECT_EQ(Set({"192.0.2.2"}), -1);
+    ASSERT_EQ(rename(At(longest).c_str(), At(kFile).c_str()), 0);
+    ASSERT_EQ(Set({"10.0.0.1"}), 0);
+    EXPECT_EQ(*Content(kFile), "nameserver 10.0.0.1");
+}
+
 TEST(ResolverText, IsReadAsTheResolverReadsIt) {
     EXPECT_THAT(appliance::Servers(" nameserver 10.9.9.9\nnameserver 10.0.0.1\nnameserver bad\nnameserver\n"
                                    "nameservers 10.8.8.8\nnameserver\t 10.0.0.2;x\nnameserver 10.0.0.3#y\r\n"

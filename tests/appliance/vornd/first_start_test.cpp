@@ -98,19 +98,29 @@ TEST(FirstStartTest, RemovesStaleTemporaryFilesOnly) {
     EXPECT_TRUE(fs::exists(other));
 }
 
-TEST(FirstStartTest, LeavesAListThatIsBeingFetched) {
-    Tree tree;
-    fs::create_directories(tree.At("/usr/vorn/etc/private/directory"));
-    const std::string abandoned = tree.At("/usr/vorn/etc/private/directory/.user_LAB.db.vorn-a1B2c3");
-    const std::string growing = tree.At("/usr/vorn/etc/private/directory/.user_LAB.db.vorn-d4E5f6");
-    for (const auto& [path, age] : {std::pair(abandoned, 4000), std::pair(growing, 1800)}) {
-        fs::copy_file(tree.At("/usr/vorn/share/capabilities.conf"), path);
-        const utimbuf old{std::time(nullptr) - age, std::time(nullptr) - age};
-        utime(path.c_str(), &old);
+TEST(FirstStartTest, LeavesAListThatIsBeingFetchedAndNoOther) {
+    for (const char* const fetch : {"", "/tmp/domain_user.pid", "/tmp/domain_group.pid"}) {
+        Tree tree;
+        fs::create_directories(tree.At("/usr/vorn/etc/private/directory"));
+        fs::create_directories(tree.At("/tmp"));
+        tree.Write("/usr/vorn/etc/private/directory/.user_LAB.db.vorn-a1B2c3", "half", 0600);
+        tree.Write("/usr/vorn/etc/private/directory/user_LAB.db", "whole", 0600);
+        if (*fetch != '\0') {
+            tree.Write(fetch, std::to_string(getpid()) + "\n", 0644);
+        }
+        Server server(tree);
+        EXPECT_EQ(fs::exists(tree.At("/usr/vorn/etc/private/directory/.user_LAB.db.vorn-a1B2c3")), *fetch != '\0');
+        EXPECT_TRUE(fs::exists(tree.At("/usr/vorn/etc/private/directory/user_LAB.db")));
     }
+}
+
+TEST(FirstStartTest, RemovesWhatAKilledServerWasWritingOfTheOptions) {
+    Tree tree;
+    tree.Write("/usr/vorn/etc/smbinfo.conf", "[global]\n", 0644);
+    tree.Write("/usr/vorn/etc/smbinfo.conf.tmp", "[glo", 0644);
     Server server(tree);
-    EXPECT_FALSE(fs::exists(abandoned));
-    EXPECT_TRUE(fs::exists(growing));
+    EXPECT_FALSE(fs::exists(tree.At("/usr/vorn/etc/smbinfo.conf.tmp")));
+    EXPECT_EQ(tree.Read("/usr/vorn/etc/smbinfo.conf"), "[global]\n");
 }
 
 TEST(FirstStartTest, PutsADamagedTaskFileAside) {

@@ -94,6 +94,24 @@ TEST_F(ModulesTest, RefusesWhatIsNoLibrary) {
     EXPECT_THAT(Refusal(tree_.At("/nowhere.so")), EndsWith("nowhere.so refused: No such file or directory"));
 }
 
+TEST_F(ModulesTest, RefusesALibraryThatWasCutShort) {
+    for (const unsigned size : {100U, 3000U, 9000U}) {
+        ASSERT_GT(std::filesystem::file_size(good_), size);
+        std::filesystem::resize_file(good_, size);
+        EXPECT_THAT(Refusal(good_), EndsWith("test_module.so refused: it is cut short"));
+        std::filesystem::remove(good_);
+        tree_.Install("test_module");
+    }
+}
+
+TEST_F(ModulesTest, RefusesALibraryForAnotherProcessor) {
+    std::fstream file(good_, std::ios::in | std::ios::out | std::ios::binary);
+    file.seekp(18);
+    file.put(static_cast<char>(0xF0));
+    file.close();
+    EXPECT_THAT(Refusal(good_), EndsWith("test_module.so refused: it is made for another kind of processor"));
+}
+
 TEST_F(ModulesTest, NamesTheSymbolThatThePlatformLacks) {
     const std::string path = tree_.Install("lacking_module");
     EXPECT_EQ(Refusal(path), "module " + path + " refused: the platform lacks the symbol VLIBCNobodyHasThis");
@@ -135,6 +153,7 @@ TEST_F(ModulesTest, ServerEndsWithoutTheModuleThatWasNamed) {
     Server server(tree_, {"--module", path}, false);
     EXPECT_EQ(server.End(), 1);
     EXPECT_THAT(server.Errors(), EndsWith("\nvornd: module " + path + " refused: its API table is empty\n"));
+    EXPECT_FALSE(std::filesystem::exists(tree_.At("/run/vorn/vornd.sock")));
 }
 
 TEST_F(ModulesTest, ServerLoadsAModuleThatIsNamed) {

@@ -218,7 +218,8 @@ TEST(DescriptionsTest, AreServedAsAnOpenApiDocument) {
     Tree tree;
     tree.Write("/usr/vorn/share/methods.json", R"([{"api": "Test.Plain", "version": 1, "method": "echo",
         "summary": "Says it again", "parameters": [{"name": "value", "type": "integer", "required": true,
-        "description": "What to say"}], "example_request": {"value": 1}, "example_answer": {"success": true}}])");
+        "description": "What to say"}, {"name": "more", "type": "object", "members": [{"name": "names",
+        "type": "array", "items": "string", "required": true}]}], "example_request": {"value": 1}, "example_answer": {"success": true}}])");
     Server server(tree);
     Client client = server.Connect();
     client.Send("GET /webapi/openapi.json HTTP/1.1\r\nHost: x\r\n\r\n");
@@ -229,6 +230,9 @@ TEST(DescriptionsTest, AreServedAsAnOpenApiDocument) {
     const Json::Value& content = echo["requestBody"]["content"]["application/json"];
     EXPECT_EQ(content["schema"]["properties"]["value"]["type"], Json::Value("integer"));
     EXPECT_EQ(content["schema"]["required"][0], Json::Value("value"));
+    const Json::Value& more = content["schema"]["properties"]["more"];
+    EXPECT_EQ(more["properties"]["names"]["items"]["type"], Json::Value("string"));
+    EXPECT_EQ(more["required"][0], Json::Value("names"));
     EXPECT_EQ(content["example"]["value"], Json::Value(1));
     EXPECT_TRUE(document["paths"].isMember("/webapi/Test.Versions/4/method"));
 }

@@ -146,8 +146,11 @@ TEST_F(SecondModuleTest, HandsOnStepsAndProgress) {
     EXPECT_EQ(data_["steps"][0]["name"], Json::Value("discover"));
     ASSERT_EQ(Call(appliance::RefreshProgress), 0);
     EXPECT_EQ(data_["count"], Json::Value(7));
-    tree_.Write("/run/vorn/refresh.json", "{");
-    EXPECT_EQ(Call(appliance::RefreshProgress), 2617);
+    for (const std::string& text :
+         {std::string("{"), std::string("[1]"), std::string("null"), std::string(100000, '[')}) {
+        tree_.Write("/run/vorn/refresh.json", text);
+        EXPECT_EQ(Call(appliance::RefreshProgress), 2617) << text.substr(0, 10);
+    }
 }
 
 TEST_F(SecondModuleTest, ListsEventsNewestFirst) {

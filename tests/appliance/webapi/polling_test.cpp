@@ -8,6 +8,7 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <thread>
 
 #include "appliance/platform/webapi/exchange.h"
 #include "appliance/platform/webapi/task_process.h"
@@ -291,6 +292,23 @@ TEST_F(PollingTest, AStartThatFailsLeavesNoRecord) {
     Json::Value tasks;
     ASSERT_TRUE(polling.List("", groups, tasks));
     EXPECT_EQ(tasks["admin"].size(), 0u);
+}
+
+TEST_F(PollingTest, OneThatIsStoppedBeforeItBeginsWasStarted) {
+    // Its process comes so late that the record is a stopped one's by then.
+    const TaskHost host{host_.database, {"/bin/sh", "-c", "sleep 1; exit 1"}};
+    request_.impl->taskHost = &host;
+    std::thread stop([this] {
+        Json::Value groups(Json::arrayValue);
+        groups.append("admin");
+        Json::Value tasks;
+        EXPECT_TRUE(Eventually(
+            [&] { return VORN::APIPolling(&request_).List("Test", groups, tasks) && tasks["admin"].size() == 1; }));
+        EXPECT_TRUE(Stop(tasks["admin"][0].asString()));
+    });
+    const std::string id = Start("TaskSteps");
+    stop.join();
+    ExpectFailure(Status(id), 121);
 }
 
 TEST_F(PollingTest, AProgramThatIsNotThereFailsTheStart) {

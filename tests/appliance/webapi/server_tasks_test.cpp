@@ -52,6 +52,12 @@ TEST_F(ServerTasksTest, SurviveTheirServerAndAreSeenByTheNext) {
     }
 }
 
+TEST_F(ServerTasksTest, ShowTheirFirstAnswerToWhoeverAsksFirst) {
+    Server server(tree_);
+    const std::string id = Start(server, "steps", Object({{"delay", 150}, {"pause", 1000}}));
+    EXPECT_EQ(Status(server, id)["data"]["step"], Json::Value(1));
+}
+
 TEST_F(ServerTasksTest, FinishWithoutTheirServer) {
     std::string id;
     {

@@ -102,6 +102,7 @@ void Version(VORN::APIRequest*, VORN::APIResponse* response) {
 
 TEST_EXPORT void TaskSteps(VORN::APIRequest* request, VORN::APIResponse* response, void*) {
     const int steps = request->GetParam("steps", 1).asInt();
+    Pause(request->GetParam("delay", 0).asInt());
     for (int step = 1; step <= steps; ++step) {
         response->SetSuccess(Number("step", step));
         Pause(request->GetParam("pause", 0).asInt());
