@@ -10,10 +10,18 @@ namespace appliance {
 
 namespace {
 
+// What went wrong last. Of an error of the system SQLite's own words name only the kind.
+std::string Words(sqlite3* database) {
+    const int system = sqlite3_system_errno(database);
+    const int kind = sqlite3_errcode(database) & 0xFF;
+    const bool told = system == 0 || (kind != SQLITE_IOERR && kind != SQLITE_CANTOPEN);
+    return sqlite3_errmsg(database) + (told ? std::string() : std::string(": ") + std::strerror(system));
+}
+
 [[noreturn]] void Fail(sqlite3* database, int code) {
     const char* file = database == nullptr ? nullptr : sqlite3_db_filename(database, "main");
     const std::string name = file == nullptr || *file == '\0' ? "database" : file;
-    throw SqliteError(code, name + ": " + (database == nullptr ? sqlite3_errstr(code) : sqlite3_errmsg(database)));
+    throw SqliteError(code, name + ": " + (database == nullptr ? sqlite3_errstr(code) : Words(database)));
 }
 
 // The path as a URI: what would mean something in one is written as %XX.
@@ -80,7 +88,7 @@ bool Statement::Step() {
     }
     if (code != SQLITE_DONE) {
         // The text of the error first: the reset may replace it.
-        const std::string text = std::string(sqlite3_db_filename(database_, "main")) + ": " + sqlite3_errmsg(database_);
+        const std::string text = std::string(sqlite3_db_filename(database_, "main")) + ": " + Words(database_);
         sqlite3_reset(statement_.get());
         throw SqliteError(code, text);
     }
@@ -135,7 +143,7 @@ Database::Database(const std::string& path, Mode mode, int busy) {
     const int code = sqlite3_open_v2(name.c_str(), &database, flags, nullptr);
     database_.reset(database);
     if (code != SQLITE_OK) {
-        throw SqliteError(code, path + ": " + (database == nullptr ? sqlite3_errstr(code) : sqlite3_errmsg(database)));
+        throw SqliteError(code, path + ": " + (database == nullptr ? sqlite3_errstr(code) : Words(database)));
     }
     sqlite3_busy_timeout(database, busy);
 }

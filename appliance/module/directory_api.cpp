@@ -68,6 +68,15 @@ Json::Value Page(EntryKind kind, const Parameters& parameters) {
     return answer;
 }
 
+bool ParseObject(const std::string& text, Json::Value& value) {
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    try {
+        return reader->parse(text.data(), text.data() + text.size(), &value, nullptr) && value.isObject();
+    } catch (const Json::Exception&) {
+        return false;  // nested too deep
+    }
+}
+
 // A JSON file that another process replaces now and then; null when it is not there.
 Json::Value ReadJson(const char* file) {
     const std::string path = Path(file);
@@ -77,10 +86,9 @@ Json::Value ReadJson(const char* file) {
         return {};
     }
     Json::Value value;
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    if (error || !reader->parse(text.data(), text.data() + text.size(), &value, nullptr)) {
+    if (error || !ParseObject(text, value)) {
         throw CallFailure(AnswerCode::SystemError,
-                          path + " can't be read: " + (error ? error.message() : std::string("no JSON text")));
+                          path + " can't be read: " + (error ? error.message() : std::string("no JSON object")));
     }
     return value;
 }

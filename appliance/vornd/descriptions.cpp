@@ -47,6 +47,17 @@ Json::Value ParameterSchema(const Json::Value& parameters) {
         property["type"] = type.isString() ? type : Json::Value("string");
         if (property["type"] == Json::Value("array")) {
             property["items"] = Json::Value(Json::objectValue);
+            if (Member(parameter, "items").isString()) {
+                property["items"]["type"] = parameter["items"];
+            }
+        }
+        if (Member(parameter, "members").isArray()) {
+            const Json::Value members = ParameterSchema(parameter["members"]);
+            for (const char* const part : {"properties", "required"}) {
+                if (members.isMember(part)) {
+                    property[part] = members[part];
+                }
+            }
         }
         if (Member(parameter, "description").isString()) {
             property["description"] = parameter["description"];

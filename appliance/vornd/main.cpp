@@ -77,11 +77,32 @@ TaskHost HostOf(const Options& options) {
     return host;
 }
 
+// Takes the socket's file away when the start fails behind it. The lock is still held then.
+class UnlessServed {
+public:
+    explicit UnlessServed(const std::string& path) : path_(path) {}
+    ~UnlessServed() {
+        if (!served_) {
+            unlink(path_.c_str());
+        }
+    }
+    UnlessServed(const UnlessServed&) = delete;
+    UnlessServed& operator=(const UnlessServed&) = delete;
+    void Served() {
+        served_ = true;
+    }
+
+private:
+    std::string path_;
+    bool served_ = false;
+};
+
 int Serve(const Options& options) {
     AdoptNotifySocket();
     MakeFolders();
     const std::string path = options.socket.empty() ? Path(kSocket) : options.socket;
     Listener listener = Listen(path);
+    UnlessServed guard(path);
     PrepareConfiguration();
     PrepareTasks();
     MethodTable table;
@@ -89,6 +110,7 @@ int Serve(const Options& options) {
     RepairLeftovers();
     const Router router(table, ReadDescriptions(Path(kDescriptions)), HostOf(options));
     const auto server = std::make_unique<Server>(std::move(listener.socket), path, router);
+    guard.Served();
     Log(LOG_NOTICE, std::string("version " VORN_VERSION " serves ") + std::to_string(table.apis().size()) +
                         " APIs of " + std::to_string(table.ModuleCount()) + " modules on " + path);
     if (!server->Run()) {

@@ -2,11 +2,15 @@
 
 #include <dirent.h>
 #include <dlfcn.h>
+#include <fcntl.h>
+#include <link.h>
 #include <stdlib.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdint>
 #include <cstring>
 #include <string_view>
 
@@ -15,6 +19,9 @@
 
 namespace appliance {
 namespace {
+
+using ElfHeader = ElfW(Ehdr);
+using ElfSegment = ElfW(Phdr);
 
 constexpr const char* kTableSymbol = "_Z11GetAPITablev";  // const VORN::APIEntry* GetAPITable()
 constexpr std::size_t kLongestTable = 1024;
@@ -71,6 +78,45 @@ bool IsSafe(const std::string& path, std::string& what) {
     }
 }
 
+template <typename Value>
+bool ReadAt(const FileDescriptor& file, std::size_t place, Value& value) {
+    return pread(file.get(), &value, sizeof value, static_cast<off_t>(place)) == static_cast<ssize_t>(sizeof value);
+}
+
+bool ReadHeader(const FileDescriptor& file, ElfHeader& header) {
+    constexpr unsigned char kOwnClass = sizeof(void*) == 8 ? ELFCLASS64 : ELFCLASS32;
+    return file && ReadAt(file, 0, header) && std::memcmp(header.e_ident, ELFMAG, SELFMAG) == 0 &&
+           header.e_ident[EI_CLASS] == kOwnClass && header.e_phentsize == sizeof(ElfSegment);
+}
+
+// A library of another machine the loader calls missing, and one that was cut short ends the process that loads it. What
+// is no library at all it names itself.
+bool IsWhole(const std::string& path, std::string& what) {
+    const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    struct stat found {};
+    ElfHeader header{};
+    if (!ReadHeader(file, header) || fstat(file.get(), &found) != 0) {
+        return true;
+    }
+    ElfHeader own{};
+    if (ReadHeader(FileDescriptor(open("/proc/self/exe", O_RDONLY | O_CLOEXEC)), own) &&
+        header.e_machine != own.e_machine) {
+        what = "it is made for another kind of processor";
+        return false;
+    }
+    const auto size = static_cast<std::uint64_t>(found.st_size);
+    for (std::size_t index = 0; index < header.e_phnum; ++index) {
+        ElfSegment segment{};
+        const bool read = ReadAt(file, header.e_phoff + index * sizeof segment, segment);
+        if (!read ||
+            (segment.p_type == PT_LOAD && (segment.p_offset > size || segment.p_filesz > size - segment.p_offset))) {
+            what = "it is cut short";
+            return false;
+        }
+    }
+    return true;
+}
+
 bool IsName(const char* name) {
     const std::size_t length = strnlen(name, kLongestName + 1);
     return length > 0 && length <= kLongestName && std::all_of(name, name + length, [](char letter) {
@@ -105,7 +151,7 @@ std::unique_ptr<Module> Module::Load(const std::string& path, std::string& reaso
     std::unique_ptr<Module> module(new Module);
     module->path_ = real.get();
     std::string what;
-    if (!IsSafe(module->path_, what)) {
+    if (!IsSafe(module->path_, what) || !IsWhole(module->path_, what)) {
         reason = Reason(path, what);
         return nullptr;
     }

@@ -6,13 +6,16 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 #include <optional>
 #include <system_error>
+#include <vector>
 
 #include "appliance/base/error_code.h"
 #include "appliance/base/file.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
+#include "appliance/base/process.h"
 #include "appliance/domain/join/recovery.h"
 #include "appliance/domain/membership/membership.h"
 #include "appliance/platform/system/task_store.h"
@@ -23,7 +26,6 @@ namespace {
 
 // A writer that lives still has its temporary file in hand for some seconds.
 constexpr int kStaleAge = 60;
-constexpr int kStaleListAge = 3600;
 
 bool Exists(const std::string& path) {
     struct stat found {};
@@ -66,6 +68,27 @@ void CheckSamba() {
     }
 }
 
+// A refresh outlives the server, and may take its time for a list; without one, nobody goes on with what is unfinished.
+int RemoveUnfinishedLists() {
+    // Looked for first: what a fetch makes that begins behind the next line is not among them.
+    std::vector<std::filesystem::path> unfinished;
+    std::error_code error;
+    std::filesystem::directory_iterator files(Path(kDirectoryData), error);
+    for (; !error && files != std::filesystem::directory_iterator(); files.increment(error)) {
+        if (!TemporaryTarget(files->path().filename().string()).empty()) {
+            unfinished.push_back(files->path());
+        }
+    }
+    if (ReadPidFile(Path(kUserPid)) >= 0 || ReadPidFile(Path(kGroupPid)) >= 0) {
+        return 0;
+    }
+    int removed = 0;
+    for (const std::filesystem::path& file : unfinished) {
+        removed += unlink(file.c_str()) == 0 ? 1 : 0;
+    }
+    return removed;
+}
+
 void RemoveTemporaries() {
     int removed = 0;
     for (const std::string& folder :
@@ -73,8 +96,9 @@ void RemoveTemporaries() {
           FolderOf(Path(kSettings)), FolderOf(Path(kCronTable)), FolderOf(Path(kJoinStatus))}) {
         removed += Exists(folder) ? RemoveStaleTemporaries(folder, kStaleAge) : 0;
     }
-    // A refresh outlives the server, and may take its time for a list.
-    removed += Exists(Path(kDirectoryData)) ? RemoveStaleTemporaries(Path(kDirectoryData), kStaleListAge) : 0;
+    removed += RemoveUnfinishedLists();
+    // Only this server's module writes that one, and it has not begun yet.
+    removed += unlink((Path(kSmbInfo) + ".tmp").c_str()) == 0 ? 1 : 0;
     if (removed > 0) {
         Log(LOG_NOTICE, std::to_string(removed) + " temporary files of killed writers removed");
     }
@@ -132,6 +156,11 @@ void PrepareTasks() {
             return;
         } catch (const SqliteError& error) {
             const int kind = error.code() & 0xFF;
+            if (kind == SQLITE_FULL || kind == SQLITE_IOERR || kind == SQLITE_READONLY) {
+                // All but the tasks works without them, and they work again when the disk has room.
+                Log(LOG_ERR, std::string("the records of background tasks can't be used: ") + error.what());
+                return;
+            }
             if (again || (kind != SQLITE_NOTADB && kind != SQLITE_CORRUPT)) {
                 throw StartError(std::string("the records of background tasks can't be used: ") + error.what());
             }

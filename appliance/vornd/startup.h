@@ -22,7 +22,7 @@ void MakeFolders();
 void PrepareConfiguration();
 
 // Opens the records of background tasks and ends those whose process is gone. A damaged file is put aside and a new one
-// made. Throws StartError.
+// made; a disk that is full or can't be written is only logged. Throws StartError.
 void PrepareTasks();
 
 // Repairs what a killed process may have left in the middle. Failures are logged; the server starts all the same.

@@ -1,6 +1,7 @@
 #include "appliance/vornd/task_main.h"
 
 #include <fcntl.h>
+#include <poll.h>
 #include <unistd.h>
 
 #include <array>
@@ -22,6 +23,8 @@ namespace appliance {
 namespace {
 
 constexpr char kBegun = 'b';
+constexpr char kAnswered = 'a';
+constexpr int kFirstAnswerWait = 500;  // milliseconds
 constexpr int kEndAttempts = 10;
 constexpr std::chrono::milliseconds kEndPause{500};
 
@@ -52,6 +55,11 @@ std::optional<Body> Begin(TaskStore& store, const TaskRecord& record) {
     return body;
 }
 
+// False when nobody listens any more.
+bool Tell(const FileDescriptor& waiting, char word) {
+    return waiting && write(waiting.get(), &word, 1) == 1;
+}
+
 // What the task's body left as its result. No answer at all is a failure.
 TaskEnd EndOf(const VORN::APIResponse& response) {
     TaskEnd end;
@@ -68,7 +76,9 @@ TaskEnd EndOf(const VORN::APIResponse& response) {
     return end;
 }
 
-TaskEnd Call(const Body& body, TaskStore& store, const TaskHost& host, const TaskRecord& record) {
+// The first answer is told to the one that waits for it.
+TaskEnd Call(const Body& body, TaskStore& store, const TaskHost& host, const TaskRecord& record,
+             FileDescriptor& waiting) {
     const std::string name = "background task " + record.id + ": ";
     VORN::APIRequest request;
     VORN::APIResponse response;
@@ -80,6 +90,8 @@ TaskEnd Call(const Body& body, TaskStore& store, const TaskHost& host, const Tas
         } catch (const SqliteError& error) {
             Log(LOG_ERR, name + "its progress is not kept: " + error.what());
         }
+        Tell(waiting, kAnswered);
+        waiting.Reset();
     };
     TaskEnd failed;
     failed.code = static_cast<int>(FrameworkCode::TaskException);
@@ -108,8 +120,8 @@ int KeepEnd(TaskStore& store, const std::string& id, const TaskEnd& end) {
     return 1;
 }
 
-// The task's process: its first word goes to the one that forked it.
-int Work(FileDescriptor begun, const TaskHost& host, const std::string& id) {
+// The task's process: its words go to the one that forked it.
+int Work(FileDescriptor waiting, const TaskHost& host, const std::string& id) {
     setsid();
     try {
         TaskStore store(host.database);
@@ -119,11 +131,10 @@ int Work(FileDescriptor begun, const TaskHost& host, const std::string& id) {
             return 1;
         }
         const std::optional<Body> body = Begin(store, *record);
-        if (!body || write(begun.get(), &kBegun, 1) != 1) {
+        if (!body || !Tell(waiting, kBegun)) {
             return 1;
         }
-        begun.Reset();
-        return KeepEnd(store, id, Call(*body, store, host, *record));
+        return KeepEnd(store, id, Call(*body, store, host, *record, waiting));
     } catch (const std::exception& error) {
         Log(LOG_ERR, "background task " + id + ": " + error.what());
         return 1;
@@ -154,7 +165,13 @@ int RunTask(const TaskHost& host, const std::string& id) {
     ssize_t got = 0;
     while ((got = read(reading.get(), &word, 1)) < 0 && errno == EINTR) {
     }
-    return got == 1 && word == kBegun ? 0 : 1;
+    if (got != 1 || word != kBegun) {
+        return 1;
+    }
+    // Whoever asks for the status next finds the task's first answer. A body that has none for long is not waited for.
+    pollfd answered{reading.get(), POLLIN, 0};
+    poll(&answered, 1, kFirstAnswerWait);
+    return 0;
 }
 
 }  // namespace appliance

@@ -52,6 +52,17 @@ def member(appliance):
     return appliance
 
 
+@pytest.fixture(scope="module")
+def joined(lab):
+    """One member of LAB.TEST for all tests of a file; each leaves it as it found it."""
+    machine = Appliance(lab, "nas1")
+    machine.renew()
+    remove_computer(lab, "nas1")
+    answer = machine.client.join("lab.test", "Administrator", password("LAB", "Administrator"))
+    assert answer.ok, machine.ctl("steps").text + machine.syslog()
+    return machine
+
+
 @pytest.fixture
 def directory(lab):
     return Directory(lab, "dc1")

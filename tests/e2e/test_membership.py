@@ -116,8 +116,12 @@ def test_the_whole_life_in_an_nt4_style_domain(appliance):
 
 
 NT4_REFUSED = [
-    ("Administrator", "wrong", 2611),
+    ("Administrator", "wrong", 2610),
+    ("nobody-here", "wrong", 2610),
     ("nina", password("NT4DOM", "nina"), 2611),
+    ("ntdisabled", password("NT4DOM", "ntdisabled"), 2609),
+    ("ntlocked", password("NT4DOM", "ntlocked"), 2608),
+    ("ntmustch", password("NT4DOM", "ntmustch"), 2612),
 ]
 
 
@@ -125,9 +129,10 @@ NT4_REFUSED = [
 def test_refused_by_an_nt4_style_domain(appliance, user, secret, code):
     before = appliance.configuration()
     answer = appliance.client.join("NT4DOM", user, secret)
-    assert not answer.ok
-    assert answer.code in (code, 2610), appliance.ctl("steps").text
+    assert answer.code == code, appliance.ctl("steps").text
+    assert answer.seconds < 30
     assert appliance.configuration() == before
+    assert appliance.client.get() == {"enable_domain": False}
 
 
 def test_a_member_changes_its_domain(member):

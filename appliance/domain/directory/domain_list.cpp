@@ -135,8 +135,12 @@ std::vector<KnownDomain> LoadDomains(const Membership& membership) {
     Json::Value list;
     Json::CharReaderBuilder form;
     std::istringstream stream(text);
-    if (!Json::parseFromStream(form, stream, &list, nullptr) || !list.isArray()) {
-        return domains;
+    try {
+        if (!Json::parseFromStream(form, stream, &list, nullptr) || !list.isArray()) {
+            return domains;
+        }
+    } catch (const Json::Exception&) {
+        return domains;  // nested too deep
     }
     std::vector<KnownDomain> stored;
     for (const Json::Value& item : list) {

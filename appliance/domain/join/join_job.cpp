@@ -70,7 +70,9 @@ void JoinJob::Run() {
         Activate();
         ConfirmTrustOfNewOne();
         Advance(Phase::Confirmed);
-    } catch (...) {
+    } catch (const std::exception& error) {
+        // Of a step that Fail has ended already nothing changes.
+        steps_.Failed(error.what());
         Undo();
         throw;
     }

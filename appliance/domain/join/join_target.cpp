@@ -265,6 +265,9 @@ private:
         call.deadline = budget_.Left(kLookupWait);
         const CommandResult result = RunNet(call);
         lookupWords_ = LastWords(result);
+        if (result.end == CommandResult::End::NotStarted) {
+            Fail(status::kSystem, Path(kNet) + " " + lookupWords_);
+        }
         return ParseLookup(result);
     }
 

@@ -156,11 +156,18 @@ std::optional<Journal> ReadJournal() {
             journal.controller = object["controller"].asString();
             return journal;
         }
-    } catch (const Json::Exception& error) {
-        Log(LOG_ERR, JournalFile() + ": " + error.what());
-        return std::nullopt;
+    } catch (const Json::Exception&) {
+        // Told below.
     }
-    Log(LOG_ERR, JournalFile() + ": no journal of a join");
+    // What it stood for nobody knows, so what might put things right by hand stays.
+    const std::string aside = journal::Folder() + ".damaged";
+    std::error_code error;
+    std::filesystem::remove_all(aside, error);
+    std::filesystem::rename(journal::Folder(), aside, error);
+    Log(LOG_ERR, JournalFile() + ": no journal of a join" + (error ? "" : "; the folder is now " + aside));
+    if (!error) {
+        MakeFolder(journal::Folder(), kFolderMode);
+    }
     return std::nullopt;
 }
 

@@ -58,6 +58,16 @@ bool NamesDirectory(std::string_view line) {
     return false;
 }
 
+bool ReadOrLog(Membership& membership) {
+    const std::error_code error = appliance::ReadMembership(membership);
+    if (error) {
+        const bool unnamed = error == std::errc::invalid_argument;
+        appliance::Log(LOG_ERR, appliance::Path(appliance::kSmbConf) + ": " +
+                                    (unnamed ? "no file that names a workgroup" : error.message()));
+    }
+    return !error;
+}
+
 }  // namespace
 
 extern "C" {
@@ -68,7 +78,7 @@ int WINIQuery1(char* name, int size, int* first, int* second) {
             return VORN_FAIL(BadArgument);
         }
         Membership membership;
-        if (appliance::ReadMembership(membership)) {
+        if (!ReadOrLog(membership)) {
             return VORN_FAIL(FileRead);
         }
         if (!appliance::CopyToBuffer(membership.domain, name, size)) {
@@ -85,7 +95,7 @@ int WINIQuery1(char* name, int size, int* first, int* second) {
 int VORNWorkgroupGet(char* workgroup, int size) {
     VORN_GUARD(-1, {
         Membership membership;
-        if (appliance::ReadMembership(membership)) {
+        if (!ReadOrLog(membership)) {
             return VORN_FAIL(FileRead);
         }
         if (!appliance::CopyToBuffer(membership.domain, workgroup, size)) {
