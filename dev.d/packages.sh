@@ -22,6 +22,8 @@ LAB_PACKAGES=(samba winbind samba-dsdb-modules samba-vfs-modules samba-ad-provis
     libsasl2-modules-gssapi-mit bind9-dnsutils libnss-winbind nftables attr acl iproute2 procps busybox cron curl
     python3 python3-samba)
 E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils python3-pytest python3-pytest-xdist)
+# realmd and adcli are measured beside the appliance; realmd answers on a message bus.
+APPLIANCE_BENCH_PACKAGES=("${RELEASE_PACKAGES[@]}" "${LAB_PACKAGES[@]}" realmd adcli dbus)
 
 packages_of_preset() {
     case $1 in

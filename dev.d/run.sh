@@ -65,13 +65,6 @@ main() {
     fi
 }
 
-# Said at once, and not after minutes of building.
-check_rights() {
-    ((EUID == 0)) || die "only root can make namespaces and install packages. Run this as root"
-    unshare --pid --fork --mount --net --uts --ipc --propagation unchanged true 2>/dev/null ||
-        die "this machine does not let root make namespaces. In a container: start it privileged (docker: --privileged)"
-}
-
 bring_up() {
     printf '\nBringing up the domains and the appliance nas1\n'
     "$LAB" up --only-new --with-pid $$ --trust --appliances nas1 --stage "$STAGE" | sed -u 's/^/  /' ||

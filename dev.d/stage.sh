@@ -5,6 +5,13 @@ BUILD=$ROOT/build/appliance
 STAGE=$ROOT/build/stage
 TARGETS=(vorn_directory_domain vorn_platform appliance_directory_module vornd vornctl vornwin vornjoin)
 
+# Whether labs can be brought up; said at once, and not after minutes of building.
+check_rights() {
+    ((EUID == 0)) || die "only root can make namespaces and install packages. Run this as root"
+    unshare --pid --fork --mount --net --uts --ipc --propagation unchanged true 2>/dev/null ||
+        die "this machine does not let root make namespaces. In a container: start it privileged (docker: --privileged)"
+}
+
 build_stage() {
     drop_foreign_build "$BUILD"
     step cmake --preset release -B "${BUILD#"$ROOT"/}" -D VORN_BUILD_APPLIANCE=ON \
