@@ -18,7 +18,8 @@ struct Switch {
 };
 
 constexpr Switch kSwitches[] = {
-    {"--server-signing", "enable_server_signing", false, "Server signing", "sign SMB connections with clients that ask for it"},
+    {"--server-signing", "enable_server_signing", false, "Server signing",
+     "sign SMB connections with clients that ask for it"},
     {"--sync-time", "enable_sync_time", false, "Time synchronisation",
      "keep the clock at the domain controller's time"},
     {"--rpc-enum", "enable_rpc_enum_usergroup", false, "Users and groups by RPC",
