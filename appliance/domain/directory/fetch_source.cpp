@@ -4,6 +4,7 @@
 #include <system_error>
 
 #include "appliance/base/file.h"
+#include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/text.h"
 #include "appliance/domain/directory/line_command.h"
@@ -22,6 +23,7 @@ constexpr std::size_t kMostControllers = 4;
 constexpr std::chrono::milliseconds kDiscoveryTime{8000};
 constexpr std::chrono::milliseconds kConnectTime{3000};
 constexpr std::chrono::milliseconds kAnswerTime{30000};
+constexpr std::chrono::milliseconds kKeytabTime{10000};
 constexpr int kLdapPort = 389;
 constexpr int kSmbPort = 445;
 constexpr int kKerberosPort = 88;
@@ -133,6 +135,28 @@ private:
     std::string text_;
 };
 
+// A keytab that fell behind the secret, as after a join that could not write it, is made anew.
+std::string TicketOfMachine(const Membership& membership) {
+    bool keyIsWrong = false;
+    std::string reason = TakeMachineTicket(membership.Account(), membership.realm, keyIsWrong);
+    if (reason.empty() || !keyIsWrong) {
+        return reason;
+    }
+    SambaCall call;
+    call.arguments = {"ads", "keytab", "create", "--machine-pass"};
+    call.deadline = kKeytabTime;
+    const CommandResult made = RunNet(call);
+    if (!made.Succeeded()) {
+        return reason;
+    }
+    reason = TakeMachineTicket(membership.Account(), membership.realm, keyIsWrong);
+    if (reason.empty()) {
+        Log(LOG_NOTICE,
+            "the keys of " + membership.Account() + " in " + Path(kKeytab) + " were not the domain's; they are now");
+    }
+    return reason;
+}
+
 }  // namespace
 
 std::vector<Controller> ControllersOf(const FetchDomain& domain, const Membership& membership) {
@@ -188,7 +212,7 @@ std::unique_ptr<LdapSession> OpenSession(const FetchDomain& domain, const Member
                 }
                 break;  // the servers are the same for each controller of another domain
             }
-            reason = TakeMachineTicket(membership.Account(), membership.realm);
+            reason = TicketOfMachine(membership);
             if (!reason.empty()) {
                 throw DirectoryError(ErrorCode::Refused,
                                      "no Kerberos ticket for " + membership.Account() + ": " + reason);

@@ -3,6 +3,7 @@
 #include <krb5.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdlib>
 #include <memory>
 #include <stdexcept>
@@ -107,7 +108,8 @@ void UseKerberosConfiguration(const std::string& path) {
     setenv("KRB5_CONFIG", path.c_str(), 1);
 }
 
-std::string TakeMachineTicket(const std::string& account, const std::string& realm) {
+std::string TakeMachineTicket(const std::string& account, const std::string& realm, bool& keyIsWrong) {
+    keyIsWrong = false;
     krb5_context raw = nullptr;
     if (krb5_error_code code = krb5_init_context(&raw); code != 0) {
         return Words(nullptr, code);
@@ -127,6 +129,8 @@ std::string TakeMachineTicket(const std::string& account, const std::string& rea
     if (code == 0) {
         code = krb5_get_init_creds_keytab(context.get(), &credentials, principal, keytab, 0, nullptr, nullptr);
         filled = code == 0;
+        keyIsWrong = code == KRB5KDC_ERR_PREAUTH_FAILED || code == KRB5_KT_NOTFOUND || code == KRB5_KT_KVNONOTFOUND ||
+                     code == KRB5KRB_AP_ERR_BAD_INTEGRITY || code == ENOENT;
     }
     if (code == 0) {
         code = krb5_cc_resolve(context.get(), kMemoryCache, &cache);

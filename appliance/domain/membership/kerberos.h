@@ -16,9 +16,10 @@ std::string WriteKerberosConfiguration(const std::string& folder, const std::str
 void UseKerberosConfiguration(const std::string& path);
 
 // Takes a ticket for the machine account (its key is in the keytab) into a MEMORY cache and makes it this process's
-// default (KRB5CCNAME). Empty on success, else the reason in words. May wait for a controller: only for a process that
-// can be killed.
-std::string TakeMachineTicket(const std::string& account, const std::string& realm);
+// default (KRB5CCNAME). Empty on success, else the reason in words; `keyIsWrong` then says whether the keytab holds no
+// key for the account, or not the one that the controller knows. May wait for a controller: only for a process that can
+// be killed.
+std::string TakeMachineTicket(const std::string& account, const std::string& realm, bool& keyIsWrong);
 
 // Removes the keys of one realm from a keytab, and the file when no key is left. A missing file is no failure. Throws
 // std::system_error.
