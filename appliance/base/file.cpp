@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -11,7 +12,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
-#include <ctime>
 #include <memory>
 #include <vector>
 
@@ -161,9 +161,18 @@ std::error_code WriteAll(int descriptor, std::string_view content) {
 
 FileDescriptor MakeTemporary(const std::string& path, std::string& name) {
     const std::string folder = FolderOf(path);
-    name = (folder == "/" ? "" : folder) + "/." + NameOf(path) + std::string(kTemporaryMark) +
-           std::string(kTemporaryLetters, 'X');
-    return FileDescriptor(mkostemp(name.data(), O_CLOEXEC));
+    const std::string form = (folder == "/" ? "" : folder) + "/." + NameOf(path) + std::string(kTemporaryMark) +
+                             std::string(kTemporaryLetters, 'X');
+    for (;;) {
+        name = form;
+        FileDescriptor made(mkostemp(name.data(), O_CLOEXEC));
+        struct stat found = {};
+        const bool taken = made && flock(made.get(), LOCK_EX | LOCK_NB) != 0 && errno == EWOULDBLOCK;
+        // Between the two calls it looks like one that was left behind, and may have been removed as that.
+        if (!taken && (!made || fstat(made.get(), &found) != 0 || found.st_nlink > 0)) {
+            return made;
+        }
+    }
 }
 
 std::string TemporaryTarget(const std::string& name) {
@@ -300,7 +309,7 @@ std::error_code MakeFolder(const std::string& path, mode_t mode) {
     return {};
 }
 
-int RemoveStaleTemporaries(const std::string& folder, int seconds) {
+int RemoveStaleTemporaries(const std::string& folder) {
     struct Close {
         void operator()(DIR* opened) const {
             closedir(opened);
@@ -310,14 +319,16 @@ int RemoveStaleTemporaries(const std::string& folder, int seconds) {
     if (!opened) {
         return 0;
     }
-    const std::time_t youngest = std::time(nullptr) - seconds;
     int removed = 0;
     while (const dirent* entry = readdir(opened.get())) {
+        if (TemporaryTarget(entry->d_name).empty()) {
+            continue;
+        }
+        const FileDescriptor file(
+            openat(dirfd(opened.get()), entry->d_name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
         struct stat found = {};
-        if (!TemporaryTarget(entry->d_name).empty() &&
-            fstatat(dirfd(opened.get()), entry->d_name, &found, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(found.st_mode) &&
-            found.st_uid == geteuid() && found.st_mtime <= youngest &&
-            unlinkat(dirfd(opened.get()), entry->d_name, 0) == 0) {
+        if (file && fstat(file.get(), &found) == 0 && S_ISREG(found.st_mode) && found.st_uid == geteuid() &&
+            flock(file.get(), LOCK_EX | LOCK_NB) == 0 && unlinkat(dirfd(opened.get()), entry->d_name, 0) == 0) {
             ++removed;
         }
     }

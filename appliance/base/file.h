@@ -63,7 +63,8 @@ std::error_code ReplaceFileLike(const std::string& path, std::string_view conten
                                 mode_t mode);
 
 // Makes an empty file of the caller's own (0600) beside `path`, with a name that nobody else has: what ReplaceFile writes
-// before it renames. None, with errno, when it can't be made. TemporaryTarget tells for which path such a name was made,
+// before it renames. The descriptor holds a lock on the file (flock), which tells RemoveStaleTemporaries that somebody
+// still writes. None, with errno, when it can't be made. TemporaryTarget tells for which path such a name was made,
 // also when that path is a symbolic link; it is empty for any other name.
 FileDescriptor MakeTemporary(const std::string& path, std::string& name);
 std::string TemporaryTarget(const std::string& name);
@@ -90,8 +91,9 @@ std::error_code RemoveFile(const std::string& path);
 std::error_code MakeFolder(const std::string& path, mode_t mode);
 
 // Removes temporary files (".<name>.vorn-XXXXXX", as MakeTemporary makes them) that a killed writer left in `folder` and that
-// no process can still be writing: those older than `seconds`. Returns how many.
-int RemoveStaleTemporaries(const std::string& folder, int seconds);
+// nobody holds the lock of. Returns how many. One whose maker has closed its descriptor and means to go on with the name
+// goes as well, so this is for a start, before such makers begin.
+int RemoveStaleTemporaries(const std::string& folder);
 
 // The folder of a path ("." without one) and its last name.
 std::string FolderOf(const std::string& path);

@@ -25,7 +25,6 @@ namespace appliance {
 namespace {
 
 // A writer that lives still has its temporary file in hand for some seconds.
-constexpr int kStaleAge = 60;
 
 bool Exists(const std::string& path) {
     struct stat found {};
@@ -94,7 +93,7 @@ void RemoveTemporaries() {
     for (const std::string& folder :
          {Path(kPrivate), Path(kJoinJournal), Path(kState), Path(kRun), FolderOf(Path(kSmbConf)),
           FolderOf(Path(kSettings)), FolderOf(Path(kCronTable)), FolderOf(Path(kJoinStatus))}) {
-        removed += Exists(folder) ? RemoveStaleTemporaries(folder, kStaleAge) : 0;
+        removed += Exists(folder) ? RemoveStaleTemporaries(folder) : 0;
     }
     removed += RemoveUnfinishedLists();
     // Only this server's module writes that one, and it has not begun yet.

@@ -113,15 +113,6 @@ def temporaries(machine):
     return [path for path in found if path and not path.startswith("/var/lib/samba/")]
 
 
-def let_time_pass(machine):
-    """For temporary files, which are left alone while they are so young that their writer may live. Those of lists and
-    the one of the options go at once."""
-    for path in temporaries(machine):
-        if path.startswith("/usr/vorn/etc/private/directory/") or path == "/usr/vorn/etc/smbinfo.conf.tmp":
-            continue
-        machine.must("touch", "-h", "-d", "2 hours ago", path)
-
-
 def check_kept(machine, before, log):
     """A changed DNS list or trust switch that belongs to no finished join is named in the log."""
     if machine.read("/etc/resolv.conf") != before["/etc/resolv.conf"][0]:
@@ -212,7 +203,6 @@ def test_a_killed_join(appliance, victims, points):
                                   dns="10.77.0.10,10.77.0.1", manage_mode=1)
             assert any(process.pid for process in killed)
             if victims == "everything":
-                let_time_pass(appliance)
             log = start_again(appliance)
             check_settled(appliance, before, log, (None, "LAB"))
     tried.done(len(points))
@@ -248,7 +238,6 @@ def test_a_killed_join_of_a_member(member, domain, points, left):
             before = member.configuration()
             kill_in_join(member, VICTIMS[victims], step, offset, domain)
             if victims == "everything":
-                let_time_pass(member)
             log = start_again(member)
             check_settled(member, before, log, left)
             if left[1] is None and not member.client.get()["enable_domain"]:
@@ -312,7 +301,6 @@ def test_a_killed_refresh(member):
             kill(lambda: VICTIMS[victims](member))
             answer = call.wait()
             if victims == "everything":
-                let_time_pass(member)
             start_again(member)
             task = answer.data["task_id"] if answer else None
             markers += check_refresh(member, task, alone=victims == "server")
@@ -329,7 +317,6 @@ def test_what_killed_writers_leave_blocks_no_start_and_goes(member):
             "/etc/.vorninfo.conf.vorn-000000", "/etc/.resolv.conf.vorn-000000", "/etc/cron.d/.vorn.vorn-000000"]
     for path in left:
         member.write(path, "half")
-    let_time_pass(member)
     for path in ("/usr/vorn/etc/smbinfo.conf.tmp", "/usr/vorn/etc/private/directory/.user_LAB.db.vorn-000000",
                  "/usr/vorn/etc/private/directory/.group_LAB.db.vorn-000000", "/usr/vorn/etc/private/join/staging.new"):
         member.write(path, "half")

@@ -98,6 +98,23 @@ def test_trusted_domains_can_be_left_out(appliance):
     assert appliance.option_of_samba("allow trusted domains") == "No"
 
 
+def test_only_the_named_interfaces_are_registered(appliance):
+    for words in ("add spare0 type veth peer name spare1", "set spare0 up", "set spare1 up"):
+        appliance.must("ip", "link", *words.split())
+    appliance.must("ip", "addr", "add", "192.0.2.77/32", "dev", "spare0")
+
+    def registered():
+        return sorted(appliance.must("dig", "+short", "nas1.lab.test", "@10.77.0.10").out.split())
+
+    options = {"enable_advance_option": True, "kdc": "", "netbios_name": "", "fqdn_name": ""}
+    for interfaces, addresses in [(["spare0"], ["192.0.2.77"]), (["all"], ["10.77.0.101", "192.0.2.77"])]:
+        answer = appliance.client.join("lab.test", *ADMINISTRATOR,
+                                       advance_domain_conf={**options, "register_nics": interfaces})
+        assert answer.ok, appliance.ctl("steps").text
+        assert registered() == addresses
+        assert appliance.client.get()["advance_domain_conf"]["register_nics"] == interfaces
+
+
 def test_the_whole_life_in_an_nt4_style_domain(appliance):
     client = appliance.client
     answer = client.join("NT4DOM", *NT_ADMINISTRATOR)

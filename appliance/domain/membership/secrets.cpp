@@ -161,6 +161,27 @@ std::optional<std::string> StoredPassword(const std::string& path, const std::st
     return text;
 }
 
+// A database leaves the bytes of what is removed where they were, and a transaction keeps a copy of what it changes. So
+// values go in place, before the transaction that removes their records: the account's password is good until somebody
+// removes the account. A value that can't be overwritten is removed all the same.
+void Overwrite(tdb_context* tdb, const std::vector<SecretsOwner>& owners) {
+    Records present;
+    if (tdb_traverse_read(tdb, CollectRecord, &present) < 0) {
+        return;
+    }
+    for (auto& [name, bytes] : present) {
+        std::string key = name;
+        if (OwnedByAny(owners, key)) {
+            const TDB_DATA value = bytes->data();
+            explicit_bzero(value.dptr, value.dsize);
+            if (WithinWait([&] { return tdb_chainlock_nonblock(tdb, KeyOf(key)) == 0; })) {
+                static_cast<void>(tdb_store(tdb, KeyOf(key), value, TDB_MODIFY));
+                tdb_chainunlock(tdb, KeyOf(key));
+            }
+        }
+    }
+}
+
 }  // namespace
 
 bool HasMachineSecret(const std::string& path, const std::string& domain) {
@@ -210,6 +231,9 @@ void ReplaceSecrets(const std::string& path, const std::string& source, const st
             return;
         }
         Throw(path, errno);
+    }
+    if (source.empty()) {
+        Overwrite(tdb.get(), owners);
     }
     if (!WithinWait([&] { return tdb_transaction_start_nonblock(tdb.get()) == 0; })) {
         Throw(path, EAGAIN);

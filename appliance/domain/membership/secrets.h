@@ -28,7 +28,7 @@ struct SecretsOwner {
 };
 
 // Makes the keys of `owners` in the database at `path` what they are in `source`, in one transaction that a crash can't
-// tear; every other key stays. With an empty `source` they are removed. Programs that have the file open see the
+// tear; every other key stays. With an empty `source` they are removed, and their bytes overwritten first. Programs that have the file open see the
 // change. Throws std::system_error.
 void ReplaceSecrets(const std::string& path, const std::string& source, const std::vector<SecretsOwner>& owners);
 

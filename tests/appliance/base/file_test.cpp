@@ -9,6 +9,7 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <csignal>
 #include <filesystem>
 #include <thread>
@@ -201,23 +202,39 @@ TEST_F(FileTest, TemporaryNames) {
 }
 
 TEST_F(FileTest, StaleTemporariesGo) {
-    std::string old;
-    std::string young;
-    appliance::MakeTemporary(path, old);
-    appliance::MakeTemporary(path, young);
-    const timespec times[2] = {{1000, 0}, {1000, 0}};
-    ASSERT_EQ(utimensat(AT_FDCWD, old.c_str(), times, 0), 0);
+    std::string left;
+    std::string held;
+    appliance::MakeTemporary(path, left);
+    FileDescriptor writer = appliance::MakeTemporary(path, held);
     Put(folder / ".hidden.backup", "");
-    ASSERT_EQ(utimensat(AT_FDCWD, (folder / ".hidden.backup").c_str(), times, 0), 0);
     std::filesystem::create_directory(folder / ".folder.vorn-aaaaaa");
-    ASSERT_EQ(utimensat(AT_FDCWD, (folder / ".folder.vorn-aaaaaa").c_str(), times, 0), 0);
-    EXPECT_EQ(appliance::RemoveStaleTemporaries(folder.path(), 60), 1);
-    EXPECT_EQ(Got(old), "<missing>");
-    EXPECT_EQ(Got(young), "");
-    EXPECT_EQ(Got(folder / ".hidden.backup"), "");
-    EXPECT_EQ(appliance::RemoveStaleTemporaries(folder.path(), 0), 1);
-    EXPECT_EQ(appliance::RemoveStaleTemporaries(folder / "none", 0), 0);
-    EXPECT_THAT(folder.Names(), ElementsAre(".folder.vorn-aaaaaa", ".hidden.backup"));
+    std::filesystem::create_symlink(folder / ".hidden.backup", folder / ".link.vorn-aaaaaa");
+    EXPECT_EQ(appliance::RemoveStaleTemporaries(folder.path()), 1);
+    EXPECT_EQ(Got(left), "<missing>");
+    EXPECT_EQ(Got(held), "");
+    writer.Reset();
+    EXPECT_EQ(appliance::RemoveStaleTemporaries(folder.path()), 1);
+    EXPECT_EQ(appliance::RemoveStaleTemporaries(folder / "none"), 0);
+    EXPECT_THAT(folder.Names(), ElementsAre(".folder.vorn-aaaaaa", ".hidden.backup", ".link.vorn-aaaaaa"));
+}
+
+// A writer whose new file was taken for one that was left behind makes another one.
+TEST_F(FileTest, TemporariesOutliveARemovalBesideThem) {
+    std::atomic<bool> done = false;
+    std::thread remover([&] {
+        while (!done) {
+            appliance::RemoveStaleTemporaries(folder.path());
+        }
+    });
+    int lost = 0;
+    for (int i = 0; i < 2000; ++i) {
+        std::string name;
+        const FileDescriptor writer = appliance::MakeTemporary(path, name);
+        lost += writer && rename(name.c_str(), path.c_str()) == 0 ? 0 : 1;
+    }
+    done = true;
+    remover.join();
+    EXPECT_EQ(lost, 0);
 }
 
 TEST_F(FileTest, RenameAndRemove) {

@@ -30,7 +30,7 @@ protected:
             const bool killed = KilledAtCall(calls, writer);
             contents.insert(Got(path));
             // Whatever it left behind is swept away, and no reader ever took it for the file.
-            appliance::RemoveStaleTemporaries(appliance::FolderOf(path), 0);
+            appliance::RemoveStaleTemporaries(appliance::FolderOf(path));
             EXPECT_EQ(Got(path), *contents.find(Got(path)));
             if (!killed) {
                 return contents;

@@ -203,7 +203,7 @@ TEST_F(SectionWriterTest, KilledAtEachCall) {
                    VLIBCSysRename(name, path.c_str()) == 0;
         });
         contents.insert(Got(path));
-        appliance::RemoveStaleTemporaries(folder.path(), 0);
+        appliance::RemoveStaleTemporaries(folder.path());
         ASSERT_THAT(folder.Names(), ElementsAre("smbinfo.conf"));
     }
     EXPECT_FALSE(killed);

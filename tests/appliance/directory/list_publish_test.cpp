@@ -65,7 +65,7 @@ protected:
 // So that the server's next start finds what a killed writer has left.
 TEST_F(ListPublishTest, AnUnfinishedListIsKnownAsATemporaryFile) {
     const appliance::ListWriter writer(appliance::EntryKind::User, "LAB");
-    EXPECT_EQ(appliance::RemoveStaleTemporaries(appliance::Path(appliance::kDirectoryData), 0), 1);
+    EXPECT_EQ(appliance::RemoveStaleTemporaries(appliance::Path(appliance::kDirectoryData)), 1);
 }
 
 TEST_F(ListPublishTest, PublishesAFileAndALinkToIt) {

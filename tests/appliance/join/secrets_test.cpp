@@ -70,6 +70,17 @@ TEST_F(SecretsTest, OfOneDomainAreRemovedAndTheMachinesOwnStay) {
     EXPECT_EQ(Secrets(kLive), expected);
 }
 
+TEST_F(SecretsTest, ThatAreRemovedLeaveNoBytes) {
+    const std::string password = "canary-of-the-machine";
+    PutSecrets(kOther, SecretsOf("LAB", "LAB.TEST", password));
+    PutSecrets(kLive, SecretsOf("LAB", "LAB.TEST", "old"));
+    appliance::ReplaceSecrets(At(kLive), At(kOther), {{"LAB", "LAB.TEST", "NAS1"}});
+    ASSERT_THAT(Content(kLive), testing::HasSubstr(password));
+    appliance::ReplaceSecrets(At(kLive), "", {{"LAB", "LAB.TEST", "NAS1"}});
+    EXPECT_THAT(Content(kLive), testing::Not(testing::HasSubstr(password)));
+    EXPECT_TRUE(Secrets(kLive).empty());
+}
+
 TEST_F(SecretsTest, AMachineNamedLikeTheDomainKeepsItsSid) {
     PutSecrets(kLive, {{"SECRETS/SID/LAB", "x"}, {"SECRETS/MACHINE_PASSWORD/LAB", "p"}});
     appliance::ReplaceSecrets(At(kLive), "", {{"LAB", "", "LAB"}});

@@ -1,16 +1,17 @@
 // The command line, the first start, and starts that can't be.
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
-#include <utime.h>
 
 #include <cerrno>
 #include <cstdio>
-#include <ctime>
 #include <filesystem>
 
+#include "appliance/base/file.h"
 #include "tests/appliance/vornd/support.h"
 
 namespace vornd_test {
@@ -84,17 +85,16 @@ TEST(FirstStartTest, KeepsWhatIsThere) {
 TEST(FirstStartTest, RemovesStaleTemporaryFilesOnly) {
     Tree tree;
     const std::string stale = tree.At("/usr/vorn/etc/.smb.conf.vorn-a1B2c3");
-    const std::string fresh = tree.At("/usr/vorn/etc/.smb.conf.vorn-d4E5f6");
+    const std::string written = tree.At("/usr/vorn/etc/.smb.conf.vorn-d4E5f6");
     const std::string other = tree.At("/usr/vorn/etc/.somebody.else");
-    for (const std::string& path : {stale, fresh, other}) {
+    for (const std::string& path : {stale, written, other}) {
         fs::copy_file(tree.At("/usr/vorn/share/capabilities.conf"), path);
     }
-    const utimbuf old{std::time(nullptr) - 4000, std::time(nullptr) - 4000};
-    utime(stale.c_str(), &old);
-    utime(other.c_str(), &old);
+    const appliance::FileDescriptor writer(open(written.c_str(), O_RDONLY | O_CLOEXEC));
+    ASSERT_EQ(flock(writer.get(), LOCK_EX), 0);
     Server server(tree);
     EXPECT_FALSE(fs::exists(stale));
-    EXPECT_TRUE(fs::exists(fresh));
+    EXPECT_TRUE(fs::exists(written));
     EXPECT_TRUE(fs::exists(other));
 }
 
