@@ -129,6 +129,8 @@ run_in_fresh_root() {
     root=$(mktemp -d "$CACHE/root.XXXXXX")
     TRASH+=("$root")
     step --title "unpacking the bare root" tar -C "$root" -xf "$archive" || die "the bare root could not be unpacked"
+    # "mktemp" closes its folder to others, and the archive says so, too; no machine's "/" is closed.
+    chmod 755 "$root"
     copy_network "$root" "$codename"
     copy_project "$root" "$worktree" || die "the project could not be copied"
     printf '\nIn the bare root: %s\n\n' "$*"
