@@ -76,7 +76,7 @@ check_machine() {
     done
     ((${#missing[@]} == 0)) ||
         die "these programs are missing: ${missing[*]}. \"./dev lab up\" installs what the lab needs"
-    [[ $(stat -c %A /) == *x ]] ||
+    [[ $(stat -c %A /) == *[xt] ]] ||
         die "this machine's \"/\" is closed to others, and the domains' services would refuse all accounts. chmod 755 /"
     unshare --pid --fork --mount --net --uts --ipc --propagation unchanged true 2>/dev/null ||
         die "this machine does not let root make namespaces. In a container: start it privileged (docker: --privileged)"
