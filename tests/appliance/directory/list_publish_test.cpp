@@ -7,6 +7,7 @@
 #include <atomic>
 #include <csignal>
 #include <filesystem>
+#include <fstream>
 #include <thread>
 
 #include "appliance/base/file.h"
@@ -65,7 +66,18 @@ protected:
 // So that the server's next start finds what a killed writer has left.
 TEST_F(ListPublishTest, AnUnfinishedListIsKnownAsATemporaryFile) {
     const appliance::ListWriter writer(appliance::EntryKind::User, "LAB");
-    EXPECT_EQ(appliance::RemoveStaleTemporaries(appliance::Path(appliance::kDirectoryData)), 1);
+    const std::string lists = appliance::Path(appliance::kDirectoryData);
+    std::vector<std::string> names;
+    for (const auto& file : std::filesystem::directory_iterator(lists)) {
+        names.push_back(file.path().filename());
+    }
+    ASSERT_EQ(names.size(), 1u);
+    EXPECT_EQ(appliance::TemporaryTarget(names.front()), "user_LAB.db");
+    // Not while it is being written, and then it goes.
+    EXPECT_EQ(appliance::RemoveStaleTemporaries(lists), 0);
+    std::ofstream(lists + "/.user_LAB.db.vorn-a1B2c3") << "left";
+    EXPECT_EQ(appliance::RemoveStaleTemporaries(lists), 1);
+    EXPECT_TRUE(std::filesystem::exists(lists + "/" + names.front()));
 }
 
 TEST_F(ListPublishTest, PublishesAFileAndALinkToIt) {
