@@ -202,7 +202,6 @@ def test_a_killed_join(appliance, victims, points):
             killed = kill_in_join(appliance, VICTIMS[victims], step, offset, "lab.test",
                                   dns="10.77.0.10,10.77.0.1", manage_mode=1)
             assert any(process.pid for process in killed)
-            if victims == "everything":
             log = start_again(appliance)
             check_settled(appliance, before, log, (None, "LAB"))
     tried.done(len(points))
@@ -237,7 +236,6 @@ def test_a_killed_join_of_a_member(member, domain, points, left):
             become_member(member)
             before = member.configuration()
             kill_in_join(member, VICTIMS[victims], step, offset, domain)
-            if victims == "everything":
             log = start_again(member)
             check_settled(member, before, log, left)
             if left[1] is None and not member.client.get()["enable_domain"]:
@@ -300,7 +298,6 @@ def test_a_killed_refresh(member):
             time.sleep(offset)
             kill(lambda: VICTIMS[victims](member))
             answer = call.wait()
-            if victims == "everything":
             start_again(member)
             task = answer.data["task_id"] if answer else None
             markers += check_refresh(member, task, alone=victims == "server")
