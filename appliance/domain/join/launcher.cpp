@@ -29,7 +29,7 @@ bool PutRight(const TimeBudget& budget) {
         return true;
     }
     if (!recovered.Succeeded()) {
-        RecoverInBackground(Wanted::Old);
+        RecoverInBackground(Wanted::OldOrNone);
     }
     return false;
 }

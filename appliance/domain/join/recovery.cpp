@@ -300,7 +300,7 @@ Recovery RecoverOnce(milliseconds patience, Wanted wanted) {
 
 void RecoverInBackground(Wanted wanted) {
     Command command;
-    command.arguments = {Path(kVornjoin), wanted == Wanted::Old ? "--recover-old-later" : "--recover-later"};
+    command.arguments = {Path(kVornjoin), wanted == Wanted::Either ? "--recover-later" : "--recover-old-later"};
     command.deadline = kStartWait;
     command.ownSession = true;
     command.endsWithCaller = false;

@@ -158,7 +158,7 @@ int main(int argc, char** argv) {
         return Recover();
     }
     if (!option.empty()) {
-        return RecoverLater(option == "--recover-later" ? appliance::Wanted::Either : appliance::Wanted::Old);
+        return RecoverLater(option == "--recover-later" ? appliance::Wanted::Either : appliance::Wanted::OldOrNone);
     }
     return DoAsRequested();
 }

@@ -209,7 +209,8 @@ TEST_F(RecoveryTest, TheOwnAccountJoinedAgainAndNeitherWorks) {
     for (const bool stored : {true, false}) {
         Interrupt(Phase::Joining, "LAB", stored);
         Answers(kRefused, kRefused);
-        const Recovery recovery = appliance::RecoverInterruptedJoin();
+        const Recovery recovery =
+            stored ? appliance::RecoverInterruptedJoin() : appliance::RecoverOnce(kPatience, Wanted::OldOrNone);
         EXPECT_EQ(recovery.result, Result::Done);
         EXPECT_FALSE(recovery.completed);
         EXPECT_THAT(recovery.notes, testing::Contains(HasSubstr("accepts no stored secret")));
