@@ -1,6 +1,7 @@
 """What the end-to-end tests share. See CAUTION: they need root, and bring up domain controllers on this machine."""
 
 import os
+import signal
 
 import pytest
 
@@ -13,6 +14,8 @@ def pytest_addoption(parser):
 
 
 def pytest_sessionstart(session):
+    # A shell that runs this in the background ignores Ctrl-C, and all that is started here would inherit that.
+    signal.signal(signal.SIGINT, signal.default_int_handler)
     if os.geteuid() != 0:
         pytest.exit("only root can bring up a lab; run the end-to-end tests as root", returncode=4)
 
