@@ -29,7 +29,7 @@ Recovery RecoverInterruptedJoin(std::chrono::milliseconds patience = std::chrono
 // What to do with a first membership whose join had come so far that it works, but was not in place yet; and with a
 // configuration for which no stored secret works any more.
 enum class Wanted {
-    Either,     // it is put in place, so that no account is left over in the domain; the appliance goes to its workgroup
+    Either,  // it is put in place, so that no account is left over in the domain; the appliance goes to its workgroup
     OldOrNone,  // somebody was told that the join failed: it is given up; the appliance goes to its workgroup
     Old,        // a failed join puts things back: it is given up; the configuration stays as it was
 };
