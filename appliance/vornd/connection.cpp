@@ -14,8 +14,8 @@
 
 #include "appliance/base/log.h"
 #include "appliance/base/text.h"
-#include "appliance/vornd/framing.h"
-#include "appliance/vornd/limits.h"
+#include "appliance/web/framing.h"
+#include "appliance/web/limits.h"
 
 namespace appliance {
 namespace {

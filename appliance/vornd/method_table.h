@@ -12,7 +12,7 @@
 #include <vector>
 
 #include "appliance/vornd/module.h"
-#include "appliance/vornd/server_codes.h"
+#include "appliance/web/server_codes.h"
 
 namespace appliance {
 

@@ -11,7 +11,7 @@
 #include "appliance/base/text.h"
 #include "appliance/platform/webapi/exchange.h"
 #include "appliance/vornd/descriptions.h"
-#include "appliance/vornd/json_text.h"
+#include "appliance/web/json_text.h"
 
 namespace appliance {
 namespace {

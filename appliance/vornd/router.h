@@ -11,7 +11,7 @@
 
 #include "appliance/platform/webapi/task_process.h"
 #include "appliance/vornd/method_table.h"
-#include "appliance/vornd/server_codes.h"
+#include "appliance/web/server_codes.h"
 
 namespace appliance {
 

@@ -10,8 +10,8 @@
 #include <vector>
 
 #include "appliance/base/log.h"
-#include "appliance/vornd/limits.h"
 #include "appliance/vornd/notify.h"
+#include "appliance/web/limits.h"
 
 namespace appliance {
 namespace {

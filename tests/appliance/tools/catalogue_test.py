@@ -105,7 +105,7 @@ class Catalogue(VornctlCase):
 
     def test_it_holds_the_codes_of_framework_and_server(self):
         framework = enumerators("appliance/platform/webapi/framework_codes.h")
-        server = enumerators("appliance/vornd/server_codes.h")
+        server = enumerators("appliance/web/server_codes.h")
         self.assertGreater(len(framework), 5)
         self.assertGreater(len(server), 10)
         self.assertEqual({number for number in self.numbers() if 100 <= number < 200}, set(framework.values()))

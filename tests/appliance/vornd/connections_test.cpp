@@ -7,7 +7,7 @@
 #include <cstdio>
 #include <thread>
 
-#include "appliance/vornd/limits.h"
+#include "appliance/web/limits.h"
 #include "tests/appliance/vornd/support.h"
 
 namespace vornd_test {

@@ -1,6 +1,6 @@
 // The JSON text of a request's body.
 
-#include "appliance/vornd/json_text.h"
+#include "appliance/web/json_text.h"
 
 #include <gtest/gtest.h>
 

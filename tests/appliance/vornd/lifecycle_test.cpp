@@ -6,7 +6,7 @@
 
 #include <filesystem>
 
-#include "appliance/vornd/limits.h"
+#include "appliance/web/limits.h"
 #include "tests/appliance/vornd/support.h"
 
 namespace vornd_test {

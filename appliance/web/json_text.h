@@ -1,7 +1,7 @@
 // The JSON text of a request's body.
 
-#ifndef VORN_APPLIANCE_VORND_JSON_TEXT_H
-#define VORN_APPLIANCE_VORND_JSON_TEXT_H
+#ifndef VORN_APPLIANCE_WEB_JSON_TEXT_H
+#define VORN_APPLIANCE_WEB_JSON_TEXT_H
 
 #include <json/value.h>
 
@@ -9,7 +9,7 @@
 #include <string>
 #include <string_view>
 
-#include "appliance/vornd/server_codes.h"
+#include "appliance/web/server_codes.h"
 
 namespace appliance {
 

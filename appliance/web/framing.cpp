@@ -1,4 +1,4 @@
-#include "appliance/vornd/framing.h"
+#include "appliance/web/framing.h"
 
 #include <algorithm>
 #include <string_view>

@@ -1,8 +1,8 @@
 // Error codes of the server itself, 200 to 299, each with the HTTP status that it comes with. Modules never answer
 // these.
 
-#ifndef VORN_APPLIANCE_VORND_SERVER_CODES_H
-#define VORN_APPLIANCE_VORND_SERVER_CODES_H
+#ifndef VORN_APPLIANCE_WEB_SERVER_CODES_H
+#define VORN_APPLIANCE_WEB_SERVER_CODES_H
 
 #include <string>
 

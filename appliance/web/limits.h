@@ -1,7 +1,7 @@
 // What the server takes at most.
 
-#ifndef VORN_APPLIANCE_VORND_LIMITS_H
-#define VORN_APPLIANCE_VORND_LIMITS_H
+#ifndef VORN_APPLIANCE_WEB_LIMITS_H
+#define VORN_APPLIANCE_WEB_LIMITS_H
 
 #include <chrono>
 #include <cstddef>

@@ -1,6 +1,6 @@
-#include "appliance/vornd/server_codes.h"
+#include "appliance/web/server_codes.h"
 
-#include "appliance/vornd/limits.h"
+#include "appliance/web/limits.h"
 
 namespace appliance {
 

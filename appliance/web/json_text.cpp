@@ -1,4 +1,4 @@
-#include "appliance/vornd/json_text.h"
+#include "appliance/web/json_text.h"
 
 #include <json/reader.h>
 #include <json/writer.h>
@@ -7,7 +7,7 @@
 #include <cstddef>
 #include <memory>
 
-#include "appliance/vornd/limits.h"
+#include "appliance/web/limits.h"
 
 namespace appliance {
 namespace {

@@ -1,7 +1,7 @@
 // Where a request ends. Two programs that disagree about it take one's request for a part of another's.
 
-#ifndef VORN_APPLIANCE_VORND_FRAMING_H
-#define VORN_APPLIANCE_VORND_FRAMING_H
+#ifndef VORN_APPLIANCE_WEB_FRAMING_H
+#define VORN_APPLIANCE_WEB_FRAMING_H
 
 #include <boost/beast/http/fields.hpp>
 #include <boost/beast/http/message.hpp>
