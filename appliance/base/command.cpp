@@ -3,18 +3,17 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/mman.h>
-#include <sys/syscall.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
 #include <csignal>
+#include <optional>
 
+#include "appliance/base/child_process.h"
 #include "appliance/base/command_child.h"
 #include "appliance/base/file.h"
-#include "appliance/base/log.h"
 
 namespace appliance {
 
@@ -23,7 +22,6 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kPauseWithoutPidfd{10};
-constexpr std::chrono::seconds kWaitAfterKill{5};
 constexpr std::size_t kMostAfterEnd = std::size_t{1} << 20;  // as much as a pipe can hold
 
 struct Pipe {
@@ -131,80 +129,14 @@ private:
     std::string text_;
 };
 
-// A started child until it is collected.
-class Running {
-public:
-    Running(pid_t pid, bool group) : pid_(pid), group_(group) {
-        handle_.Reset(static_cast<int>(syscall(SYS_pidfd_open, pid, 0)));
-    }
-
-    ~Running() {
-        if (!collected_) {
-            Kill();
-        }
-    }
-    Running(const Running&) = delete;
-    Running& operator=(const Running&) = delete;
-
-    // -1 when the kernel had none to give; Collect then has to be asked again and again.
-    int handle() const {
-        return handle_.get();
-    }
-
-    // True when the child has ended; `result` says how.
-    bool Collect(CommandResult& result) {
-        int status = 0;
-        const pid_t collected = waitpid(pid_, &status, WNOHANG);
-        if (collected == 0 || (collected < 0 && errno == EINTR)) {
-            return false;
-        }
-        collected_ = true;
-        if (collected < 0) {
-            // Somebody collects all children of this process, or ignores SIGCHLD: how it ended is lost.
-            result.end = CommandResult::End::NotStarted;
-            result.code = errno;
-        } else if (WIFEXITED(status)) {
-            result.end = CommandResult::End::Exited;
-            result.code = WEXITSTATUS(status);
-        } else {
-            result.end = CommandResult::End::Signalled;
-            result.code = WTERMSIG(status);
-        }
-        return true;
-    }
-
-    // Ends it, and collects it unless the kernel holds on to it beyond some seconds.
-    void Kill() {
-        // Not yet collected, so the id is still its own.
-        if (!group_ || kill(-pid_, SIGKILL) != 0) {
-            kill(pid_, SIGKILL);
-        }
-        CommandResult ignored;
-        const auto end = Clock::now() + kWaitAfterKill;
-        while (!Collect(ignored)) {
-            const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - Clock::now());
-            if (left.count() <= 0) {
-                collected_ = true;  // as far as that goes
-                Log(LOG_ERR, "process " + std::to_string(pid_) + " does not end after SIGKILL");
-                return;
-            }
-            pollfd ended = {handle_.get(), POLLIN, 0};
-            const auto pause = handle_ ? left : std::min(left, kPauseWithoutPidfd);
-            poll(&ended, 1, static_cast<int>(pause.count()));
-        }
-    }
-
-private:
-    pid_t pid_;
-    bool group_;
-    bool collected_ = false;
-    FileDescriptor handle_;
-};
-
 // Reads both outputs until the child has ended or the deadline has passed.
-void Follow(Running& child, Output& output, Output& errors, Clock::time_point end, CommandResult& result) {
+void Follow(ChildProcess& child, Output& output, Output& errors, Clock::time_point end, CommandResult& result) {
     constexpr std::size_t kOneTurn = std::size_t{1} << 18;
-    while (!child.Collect(result)) {
+    for (;;) {
+        if (const std::optional<ChildEnd> ended = child.Look()) {
+            SetEnd(*ended, result);
+            break;
+        }
         const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - Clock::now());
         if (left.count() <= 0) {
             child.Kill();
@@ -268,7 +200,7 @@ CommandResult Start(const Command& command, CommandChild& child, Clock::time_poi
     child.status.Reset();
 
     CommandResult result;
-    Running running(pid, group);
+    ChildProcess running(pid, group ? ChildProcess::Reach::Group : ChildProcess::Reach::Process);
     Output out(std::move(output.read), command.outputLimit);
     Output err(std::move(errors.read), command.outputLimit);
     Follow(running, out, err, end, result);
@@ -285,6 +217,13 @@ CommandResult Start(const Command& command, CommandChild& child, Clock::time_poi
 }
 
 }  // namespace
+
+void SetEnd(const ChildEnd& end, CommandResult& result) {
+    result.end = end.how == ChildEnd::How::Exited      ? CommandResult::End::Exited
+                 : end.how == ChildEnd::How::Signalled ? CommandResult::End::Signalled
+                                                       : CommandResult::End::NotStarted;
+    result.code = end.code;
+}
 
 std::string CommandResult::Describe() const {
     switch (end) {

@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "appliance/base/child_process.h"
 #include "appliance/base/secret.h"
 
 namespace appliance {
@@ -64,6 +65,9 @@ struct CommandResult {
     // started: No such file or directory".
     std::string Describe() const;
 };
+
+// Takes over how a program's process ended. One whose end is lost counts as not started.
+void SetEnd(const ChildEnd& end, CommandResult& result);
 
 // Runs the program and waits for its end. Never throws but for std::bad_alloc; safe from several threads at once. Needs
 // the default action of SIGCHLD and waits for this one process only. The program's working folder is the caller's. What a

@@ -52,6 +52,14 @@ std::optional<FileLock> FileLock::Take(const std::string& path, std::chrono::mil
     }
 }
 
+bool FileLock::IsHeld(const std::string& path) {
+    const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NOCTTY | O_NONBLOCK));
+    struct flock whole = {};
+    whole.l_type = F_WRLCK;
+    whole.l_whence = SEEK_SET;
+    return file && fcntl(file.get(), F_OFD_GETLK, &whole) == 0 && whole.l_type != F_UNLCK;
+}
+
 FileLock::~FileLock() {
     // Closing alone would leave the lock to a child that was forked a moment ago and has not yet come to its exec.
     if (descriptor_) {

@@ -20,6 +20,10 @@ public:
     // Waits up to `wait` for the lock; nothing when it could not be had (errno tells: EAGAIN, or what open says).
     static std::optional<FileLock> Take(const std::string& path, std::chrono::milliseconds wait);
 
+    // Does somebody hold the lock at this moment? Takes nothing, so that nobody who wants the lock is in its way. A missing
+    // file, or one that can't be opened, is held by nobody. The caller's own lock counts as well.
+    static bool IsHeld(const std::string& path);
+
     ~FileLock();
     FileLock(FileLock&&) noexcept = default;
     FileLock& operator=(FileLock&& other) noexcept {

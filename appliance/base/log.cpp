@@ -1,8 +1,32 @@
 #include "appliance/base/log.h"
 
+#include <unistd.h>
+
 #include <cstdio>
 
+#include "appliance/base/file.h"
+#include "appliance/base/system_log.h"
+
 namespace appliance {
+namespace {
+
+// Lives as long as the process: threads log until its end.
+struct OwnLog {
+    SystemLog system;
+    std::string name;
+    bool terminal;
+};
+OwnLog* ownLog = nullptr;
+
+}  // namespace
+
+void LogWithoutWaiting(const std::string& name, bool terminal) {
+    if (ownLog != nullptr) {
+        ownLog->terminal = terminal;
+        return;
+    }
+    ownLog = new OwnLog{{name, LOG_DAEMON}, name, terminal};
+}
 
 void Log(int priority, const std::string& text) {
     std::string line;
@@ -17,7 +41,14 @@ void Log(int priority, const std::string& text) {
             line += letter;
         }
     }
-    syslog(priority, "%s", line.c_str());
+    if (ownLog == nullptr) {
+        syslog(priority, "%s", line.c_str());
+        return;
+    }
+    ownLog->system.Send(priority, line);
+    if (ownLog->terminal) {
+        static_cast<void>(WriteAll(STDERR_FILENO, ownLog->name + "[" + std::to_string(getpid()) + "]: " + line + "\n"));
+    }
 }
 
 }  // namespace appliance

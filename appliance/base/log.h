@@ -13,6 +13,11 @@ namespace appliance {
 // shown as \xNN, so that a line stays one line. Never a secret.
 void Log(int priority, const std::string& text);
 
+// From now on lines of Log go to the system's logger under this name as the facility LOG_DAEMON, and to standard error as
+// well when `terminal`; a line that the logger does not take at once is lost, so that nothing waits for it. Servers begin
+// with this; other programs call openlog(3). Once, before threads run.
+void LogWithoutWaiting(const std::string& name, bool terminal);
+
 }  // namespace appliance
 
 #endif

@@ -23,12 +23,14 @@ inline constexpr const char kModules[] = "/usr/vorn/lib/modules";
 inline constexpr const char kVornd[] = "/usr/vorn/sbin/vornd";
 inline constexpr const char kVornwin[] = "/usr/vorn/sbin/vornwin";
 inline constexpr const char kVornjoin[] = "/usr/vorn/sbin/vornjoin";
+inline constexpr const char kVornauth[] = "/usr/vorn/sbin/vornauth";
 
 // State that lasts. Folders of the first kind belong to root and are closed to all others (0700).
 inline constexpr const char kPrivate[] = "/usr/vorn/etc/private";
 inline constexpr const char kDirectoryData[] = "/usr/vorn/etc/private/directory";  // complete users' and groups' lists
 inline constexpr const char kJoinJournal[] = "/usr/vorn/etc/private/join";         // what an interrupted join puts back
 inline constexpr const char kState[] = "/var/lib/vorn";
+inline constexpr const char kLastTest[] = "/var/lib/vorn/last_test.json";
 inline constexpr const char kTasks[] = "/var/lib/vorn/tasks.db";
 inline constexpr const char kEvents[] = "/var/lib/vorn/events.db";
 inline constexpr const char kSchedule[] = "/usr/vorn/etc/schedule.conf";
@@ -40,6 +42,7 @@ inline constexpr const char kSambaPrivate[] = "/var/lib/samba/private";
 // State that ends with the machine's run.
 inline constexpr const char kRun[] = "/run/vorn";
 inline constexpr const char kSocket[] = "/run/vorn/vornd.sock";
+inline constexpr const char kSessions[] = "/run/vorn/sessions.json";
 inline constexpr const char kJoinLock[] = "/run/vorn/join.lock";
 inline constexpr const char kJoinSteps[] = "/run/vorn/join_steps.json";
 inline constexpr const char kRefreshProgress[] = "/run/vorn/refresh.json";

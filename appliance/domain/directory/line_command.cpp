@@ -3,7 +3,6 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/prctl.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -11,6 +10,7 @@
 #include <cerrno>
 #include <csignal>
 
+#include "appliance/base/child_process.h"
 #include "appliance/base/file.h"
 
 namespace appliance {
@@ -46,31 +46,6 @@ std::vector<char*> Pointers(std::vector<std::string>& texts) {
     pointers.push_back(nullptr);
     return pointers;
 }
-
-// The program, killed and collected when it is left before its end.
-class Program {
-public:
-    explicit Program(pid_t pid) : pid_(pid) {}
-    ~Program() {
-        if (pid_ > 0) {
-            kill(pid_, SIGKILL);
-            Wait();
-        }
-    }
-    Program(const Program&) = delete;
-    Program& operator=(const Program&) = delete;
-
-    int Wait() {
-        int status = 0;
-        while (waitpid(pid_, &status, 0) < 0 && errno == EINTR) {
-        }
-        pid_ = -1;
-        return status;
-    }
-
-private:
-    pid_t pid_;
-};
 
 }  // namespace
 
@@ -111,7 +86,7 @@ CommandResult RunLines(const Command& command, const std::function<void(const st
         }
         _exit(127);
     }
-    Program program(pid);
+    ChildProcess program(pid);
     output.writing.Reset();
     errors.writing.Reset();
     start.writing.Reset();
@@ -177,9 +152,7 @@ CommandResult RunLines(const Command& command, const std::function<void(const st
     if (!text.empty()) {
         take(text);
     }
-    const int status = program.Wait();
-    result.end = WIFEXITED(status) ? CommandResult::End::Exited : CommandResult::End::Signalled;
-    result.code = WIFEXITED(status) ? WEXITSTATUS(status) : WTERMSIG(status);
+    SetEnd(program.Wait(), result);
     return result;
 }
 

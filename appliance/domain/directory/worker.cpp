@@ -5,7 +5,6 @@
 #include <json/writer.h>
 #include <poll.h>
 #include <sys/prctl.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -19,6 +18,7 @@
 #include <string_view>
 #include <system_error>
 
+#include "appliance/base/child_process.h"
 #include "appliance/base/sqlite.h"
 
 namespace appliance {
@@ -73,32 +73,6 @@ Json::Value Failure(ErrorCode code, const char* reason) {
     _exit(0);
 }
 
-// The child, killed and collected at the end unless that has happened.
-class Child {
-public:
-    explicit Child(pid_t pid) : pid_(pid) {}
-    ~Child() {
-        if (pid_ > 0) {
-            kill(pid_, SIGKILL);
-            Collect();
-        }
-    }
-    Child(const Child&) = delete;
-    Child& operator=(const Child&) = delete;
-
-    // Its status, as waitpid gives it.
-    int Collect() {
-        int status = 0;
-        while (waitpid(pid_, &status, 0) < 0 && errno == EINTR) {
-        }
-        pid_ = -1;
-        return status;
-    }
-
-private:
-    pid_t pid_;
-};
-
 Json::Value ResultOf(const std::string& line) {
     Json::Value answer;
     Json::CharReaderBuilder form;
@@ -146,7 +120,7 @@ Json::Value RunWorker(const Patience& patience, const std::function<Json::Value(
         reading.Reset();
         LiveAsChild(writing.get(), parent, work);
     }
-    Child child(pid);
+    ChildProcess child(pid);
     writing.Reset();
 
     const Clock::time_point end = Clock::now() + patience.overall;
@@ -183,7 +157,7 @@ Json::Value RunWorker(const Patience& patience, const std::function<Json::Value(
             const std::string words = text.substr(0, line);
             text.erase(0, line + 1);
             if (!words.empty() && words.front() == '=') {
-                child.Collect();
+                child.Wait();
                 return ResultOf(words.substr(1));
             }
             std::int64_t count = 0;
@@ -196,10 +170,11 @@ Json::Value RunWorker(const Patience& patience, const std::function<Json::Value(
             }
         }
     }
-    const int status = child.Collect();
-    throw DirectoryError(ErrorCode::CommandFailed, WIFSIGNALED(status) ? "the helper process was ended by signal " +
-                                                                             std::to_string(WTERMSIG(status))
-                                                                       : "the helper process ended without an answer");
+    const ChildEnd ended = child.Wait();
+    throw DirectoryError(ErrorCode::CommandFailed,
+                         ended.how == ChildEnd::How::Signalled
+                             ? "the helper process was ended by signal " + std::to_string(ended.code)
+                             : "the helper process ended without an answer");
 }
 
 }  // namespace appliance

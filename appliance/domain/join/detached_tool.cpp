@@ -2,15 +2,16 @@
 
 #include <fcntl.h>
 #include <sys/file.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <array>
 #include <cerrno>
 #include <csignal>
+#include <optional>
 #include <thread>
 #include <vector>
 
+#include "appliance/base/child_process.h"
 #include "appliance/base/file.h"
 
 namespace appliance {
@@ -96,26 +97,6 @@ bool Prepare(const Command& command, const std::string& folder, Prepared& prepar
     _exit(127);
 }
 
-// True when it has ended; then `result` says how.
-bool Collect(pid_t pid, CommandResult& result) {
-    int status = 0;
-    const pid_t collected = waitpid(pid, &status, WNOHANG);
-    if (collected == 0 || (collected < 0 && errno == EINTR)) {
-        return false;
-    }
-    if (collected < 0) {
-        result.end = CommandResult::End::NotStarted;
-        result.code = errno;
-    } else if (WIFEXITED(status)) {
-        result.end = CommandResult::End::Exited;
-        result.code = WEXITSTATUS(status);
-    } else {
-        result.end = CommandResult::End::Signalled;
-        result.code = WTERMSIG(status);
-    }
-    return true;
-}
-
 }  // namespace
 
 CommandResult RunDetached(const Command& command, const std::string& folder) {
@@ -135,16 +116,18 @@ CommandResult RunDetached(const Command& command, const std::string& folder) {
         return result;
     }
     prepared.lock.Reset();
+    ChildProcess tool(pid, ChildProcess::Reach::Group);
     const auto end = began + command.deadline;
-    while (!Collect(pid, result)) {
-        if (Clock::now() >= end) {
-            kill(-pid, SIGKILL);
-            kill(pid, SIGKILL);
-            waitpid(pid, nullptr, 0);
-            result.end = CommandResult::End::TimedOut;
-            break;
-        }
+    std::optional<ChildEnd> ended = tool.Look();
+    while (!ended && Clock::now() < end) {
         std::this_thread::sleep_for(kPause);
+        ended = tool.Look();
+    }
+    if (ended) {
+        SetEnd(*ended, result);
+    } else {
+        tool.Kill();
+        result.end = CommandResult::End::TimedOut;
     }
     result.took = std::chrono::duration_cast<milliseconds>(Clock::now() - began);
     static_cast<void>(ReadFile(folder + kOutput, result.output, command.outputLimit));

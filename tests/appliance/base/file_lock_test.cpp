@@ -55,6 +55,22 @@ TEST_F(FileLockTest, TakenAndGivenBack) {
     EXPECT_EQ(found.st_mode & 07777, 0600U);
 }
 
+TEST_F(FileLockTest, TellsWhetherItIsHeldWithoutTakingIt) {
+    EXPECT_FALSE(FileLock::IsHeld(path));
+    EXPECT_EQ(Got(path), "<missing>");
+    {
+        const auto lock = FileLock::Take(path, milliseconds(0));
+        EXPECT_TRUE(FileLock::IsHeld(path));
+    }
+    EXPECT_FALSE(FileLock::IsHeld(path));
+    const pid_t holder = Holder();
+    EXPECT_TRUE(FileLock::IsHeld(path));
+    kill(holder, SIGKILL);
+    WaitFor(holder);
+    EXPECT_FALSE(FileLock::IsHeld(path));
+    EXPECT_TRUE(FileLock::Take(path, milliseconds(0)));
+}
+
 TEST_F(FileLockTest, MovesWithItsOwner) {
     auto lock = FileLock::Take(path, milliseconds(0));
     ASSERT_TRUE(lock);
