@@ -39,8 +39,49 @@ The body is one JSON object of parameters; without parameters it may be empty. T
 the highest version of the method that is not above it answers. `GET /webapi` lists what is loaded and
 `GET /webapi/openapi.json` describes it as OpenAPI.
 
+## Who may call
+
 The server, `vornd`, listens on the unix socket `/run/vorn/vornd.sock`. Who may call is decided by the peer's
 credentials: root may. `vornctl call API VERSION METHOD [JSON]` calls any method from the command line.
+
+From the network the same paths are reached through `vorn-httpd`, by TLS and in a session of an administrator who has
+logged in. The account that it runs as, `vorn-httpd`, may by itself do nothing on the socket but log in; all other
+accounts may only `GET /metrics`.
+
+## Sessions
+
+| Request | Answer's data |
+|---|---|
+| `POST /session/login` `{"user", "password"}` | "csrf", "user", "idle_seconds", "expires" |
+| `POST /session/link` `{"token"}` | the same |
+| `GET /session` | the same, of the session that the request is in |
+| `POST /session/logout` | null |
+| `POST /session/new-link` | "token", "expires"; on the socket, of root alone |
+
+A log-in is checked by PAM (service `vorn`); the user must also be in the machine's group `administrators`. The link of
+`vornctl link` logs in once, as root, within 10 minutes after it was made and until the server is started anew.
+
+The session is in a cookie that scripts can't read. Each request that is not a GET carries the "csrf" of its session as
+the header `X-CSRF-Token`. A session ends 15 minutes after the last request that is not marked with `X-Background: 1`,
+12 hours after the log-in ("expires", in seconds since 1970), or when it is logged out; a call that runs keeps it from
+ending for want of use. When a session ends while a call of it runs, the call goes on to its end, but its answer is
+withheld: 401 with code 220. There are at most 64 sessions; one more ends the one that is unused for the longest time.
+They outlive a restart of the server, but not one of the machine.
+
+After five failures within 15 minutes, of one user or from one address (of IPv6: one network of 64 bits), the next
+attempt has to wait 30 seconds, and twice as long after each further failure, up to 15 minutes: until then it is
+answered with 429 and the header `Retry-After`. A refused password is answered after 2 seconds, or a multiple of them,
+whatever is wrong with it. Two passwords are checked at a time and eight attempts wait.
+
+On the socket the session is named by headers instead: `vorn-httpd` sets `Vorn-Session` and `Vorn-Csrf`, `Vorn-Client`
+(the browser's address, for the throttle and the log) and `Vorn-Background: 1`. The data of a log-in hold "session"
+there, the token: the server keeps only its SHA-256.
+
+## Figures
+
+`GET /metrics` answers in the text form of Prometheus: requests by API, method and code, how long they took, calls that
+run and wait, connections, sessions, background tasks, the state of the membership and its last test, number, size and
+age of the lists of users and groups. No name of a domain, a user or a host is in it.
 
 ## Answers
 
@@ -50,23 +91,25 @@ shape with codes of their own and the reason in "errors":
 
 | Status | When |
 |---|---|
-| 400 | the request is no HTTP, its body no JSON, nested deeper than 10 levels, no object, or it names a key twice |
-| 401 | the caller is not allowed |
+| 400 | no HTTP; a body that is no JSON or no object, has more than 10 levels or a key twice; a log-in's parameter is missing |
+| 401 | the caller is not allowed, is in no session, or what it logs in with is wrong |
+| 403 | the session's CSRF token is missing or wrong, or a page of another address sent the request |
 | 404 | no such API, method, version or path |
 | 405 | another verb than POST for a call, or GET for a description |
 | 408 | the request was not complete in time |
 | 413 | the header or the body is too large |
 | 415 | the body is not `application/json` |
+| 429 | too many log-ins have failed; `Retry-After` says how many seconds to wait |
 | 500 | the module failed or gave no answer |
-| 503 | too many calls wait, too many connections are open, or the server is about to end |
+| 503 | too many calls or connections; passwords can't be checked; the server is about to end or does not answer |
 
 [error-codes.md](error-codes.md) says what each code means and what to do.
 
 ## Limits
 
 Header 8 KiB; body 64 KiB; 10 levels of JSON, no key twice in an object; 15 seconds from a request's first byte to its
-last; 256 connections, of which the oldest idle one makes room for a newcomer; 64 waiting calls. When the server is told
-to end, calls that wait are refused and those that run go on to their end.
+last; 256 connections, of which the oldest idle one makes room for a newcomer and 192 at most are of `vorn-httpd`; 64
+waiting calls. When the server is told to end, calls that wait are refused and those that run go on to their end.
 
 Parameters are not converted: a number is no text, and a text is no switch. A method that gets a wrong one answers 2618.
 A parameter that a method does not know is passed over.

@@ -3,6 +3,7 @@
 #include "appliance/module/directory_api.h"
 #include "appliance/module/event_api.h"
 #include "appliance/module/leave_api.h"
+#include "appliance/module/overview_api.h"
 #include "appliance/module/parameters.h"
 
 namespace {
@@ -22,6 +23,7 @@ const VORN::APIEntry gTable[] = {
     {kDirectoryApi, 1, "users", Serve<appliance::Users>},
     {kDirectoryApi, 1, "groups", Serve<appliance::Groups>},
     {kDirectoryApi, 1, "domains", Serve<appliance::Domains>},
+    {kDirectoryApi, 1, "overview", Serve<appliance::Overview>},
     {kDirectoryApi, 1, "refresh_progress", Serve<appliance::RefreshProgress>},
     {kDirectoryApi, 1, "join_steps", Serve<appliance::JoinSteps>},
     {kDirectoryApi, 1, "leave", Serve<appliance::Leave>},

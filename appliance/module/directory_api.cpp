@@ -1,14 +1,9 @@
 #include "appliance/module/directory_api.h"
 
-#include <json/reader.h>
-
-#include <memory>
 #include <optional>
 #include <string>
 #include <system_error>
 
-#include "appliance/base/file.h"
-#include "appliance/base/paths.h"
 #include "appliance/base/text.h"
 #include "appliance/domain/directory/directory_store.h"
 #include "appliance/domain/membership/membership.h"
@@ -68,31 +63,6 @@ Json::Value Page(EntryKind kind, const Parameters& parameters) {
     return answer;
 }
 
-bool ParseObject(const std::string& text, Json::Value& value) {
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    try {
-        return reader->parse(text.data(), text.data() + text.size(), &value, nullptr) && value.isObject();
-    } catch (const Json::Exception&) {
-        return false;  // nested too deep
-    }
-}
-
-// A JSON file that another process replaces now and then; null when it is not there.
-Json::Value ReadJson(const char* file) {
-    const std::string path = Path(file);
-    std::string text;
-    const std::error_code error = ReadFile(path, text);
-    if (error == std::errc::no_such_file_or_directory) {
-        return {};
-    }
-    Json::Value value;
-    if (error || !ParseObject(text, value)) {
-        throw CallFailure(AnswerCode::SystemError,
-                          path + " can't be read: " + (error ? error.message() : std::string("no JSON object")));
-    }
-    return value;
-}
-
 }  // namespace
 
 Json::Value Users(const Parameters& parameters) {
@@ -115,14 +85,6 @@ Json::Value Domains(const Parameters& /*parameters*/) {
         answer["domains"].append(shown);
     }
     return answer;
-}
-
-Json::Value RefreshProgress(const Parameters& /*parameters*/) {
-    return ReadJson(kRefreshProgress);
-}
-
-Json::Value JoinSteps(const Parameters& /*parameters*/) {
-    return ReadJson(kJoinSteps);
 }
 
 }  // namespace appliance

@@ -1,10 +1,8 @@
-// VORN.Appliance.Directory: the lists of domain users and groups, and what is going on with the membership.
+// VORN.Appliance.Directory: the lists of domain users and groups.
 //
 // users, groups     {"domain": "LAB", "offset": 0, "limit": 100, "search": "an"}
 //                   answers {"total", "offset", "domain", "fetched", "entries": [{"name", "id", "display"}]}
 // domains           answers {"domains": [{"domain", "kind", "count", "fetched"}]}: which lists there are
-// refresh_progress  answers how far the last fetch is, or null when there was none since the machine's start
-// join_steps        answers the steps of the last join or leave, or null when there was none since the machine's start
 
 #ifndef VORN_APPLIANCE_MODULE_DIRECTORY_API_H
 #define VORN_APPLIANCE_MODULE_DIRECTORY_API_H
@@ -20,8 +18,6 @@ Json::Value Users(const Parameters& parameters);
 Json::Value Groups(const Parameters& parameters);
 
 Json::Value Domains(const Parameters& parameters);
-Json::Value RefreshProgress(const Parameters& parameters);
-Json::Value JoinSteps(const Parameters& parameters);
 
 }  // namespace appliance
 

@@ -1,7 +1,9 @@
-// How far a fetch is, for those who watch it: /run/vorn/refresh.json.
+// How far a refresh is, for those who watch it, and how the last one ended: /run/vorn/refresh.json.
 
 #ifndef VORN_APPLIANCE_DOMAIN_DIRECTORY_PROGRESS_H
 #define VORN_APPLIANCE_DOMAIN_DIRECTORY_PROGRESS_H
+
+#include <json/value.h>
 
 #include <chrono>
 #include <cstdint>
@@ -19,8 +21,10 @@ struct FetchFailure {
 };
 
 // {"kind": "user"|"group", "domain": text, "count": entries of this domain so far, "domains_done": int, "domains": int,
-// "started": s, "updated": s, "errors": [{"domain", "kind", "reason"}]}, times in seconds since 1970. The file is
-// replaced at most every 200 milliseconds. One that can't be written is no failure of the fetch.
+// "started": s, "updated": s, "finished": s|null, "errors": [{"domain", "kind", "reason"}], "process": {"pid", "start"}},
+// times in seconds since 1970. A refresh fetches users, then groups, in one process: its record begins with the first and
+// goes on with the second, errors of both in it. The file is replaced at most every 200 milliseconds. One that can't be
+// written is no failure of the fetch.
 class FetchProgress {
 public:
     FetchProgress(EntryKind kind, int domains);
@@ -47,7 +51,18 @@ private:
     std::chrono::steady_clock::time_point written_{};
     bool complained_ = false;
     std::vector<FetchFailure> failures_;
+    Json::Value earlier_;  // the errors of the users, when these are the groups
 };
+
+// The part of a refresh before the first fetch, which looks which domains there are: no domain is named yet. The second
+// says why there will be no fetch; the refresh of this process is over.
+void RecordRefreshBegin();
+void RecordRefreshFailure(const std::string& domain, const std::string& reason);
+
+// What a watcher is to see of a record, as it was read: without "process", with "running", and with the end of a refresh
+// that was stopped or killed, and its error. `record` is an object, or null when there is none: null, too, but for a
+// refresh that is about to begin.
+Json::Value ShownProgress(Json::Value record);
 
 }  // namespace appliance
 

@@ -13,6 +13,7 @@
 #include "appliance/domain/join/recovery.h"
 #include "appliance/domain/join/step_log.h"
 #include "appliance/domain/join/time_budget.h"
+#include "appliance/domain/membership/last_test.h"
 
 namespace appliance {
 
@@ -58,6 +59,7 @@ JobResult RunUnderLock(const JoinRequest& request, const JobHooks& hooks, const 
     JoinStatus status;
     try {
         Work(request, hooks, steps, budget);
+        ForgetLastTest();
         steps.Finish(true, "");
         return {true, {}};
     } catch (const JoinError& error) {

@@ -19,6 +19,7 @@
 #include "appliance/domain/join/step_log.h"
 #include "appliance/domain/join/time_budget.h"
 #include "appliance/domain/join/winbind.h"
+#include "appliance/domain/membership/last_test.h"
 #include "appliance/domain/membership/secrets.h"
 #include "appliance/platform/system/services.h"
 
@@ -281,6 +282,9 @@ Recovery RecoverAndName(milliseconds patience, Wanted wanted, std::time_t before
                 Log(LOG_WARNING, "an interrupted join left something changed: " + change);
                 recovery.notes.push_back(change);
             }
+        }
+        if (recovery.result == Result::Done) {
+            ForgetLastTest();
         }
         if (recovery.result == Result::Nothing || recovery.result == Result::Done) {
             EndInterruptedSteps(recovery.completed, recovery.notes);

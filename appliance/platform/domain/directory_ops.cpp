@@ -9,6 +9,7 @@
 #include "appliance/base/text.h"
 #include "appliance/domain/directory/domain_list.h"
 #include "appliance/domain/directory/fetch.h"
+#include "appliance/domain/directory/progress.h"
 #include "appliance/domain/directory/units.h"
 #include "appliance/domain/membership/idmap.h"
 #include "appliance/platform/last_error.h"
@@ -51,7 +52,9 @@ int VORNWinUpdateAllDomains(void) {
         if (!membership.Joined()) {
             return VORN_FAIL(NotMember);
         }
+        appliance::RecordRefreshBegin();
         if (!appliance::RefreshDomains(membership)) {
+            appliance::RecordRefreshFailure(membership.domain, "no domain controller tells which domains there are");
             return VORN_FAIL(Unreachable);
         }
         // A domain that is new gets its range of ids before its users come; without one they'd have no ids.
@@ -75,7 +78,9 @@ int VORNWinUpdateOU(void) {
         if (!membership.Joined()) {
             return VORN_FAIL(NotMember);
         }
+        appliance::RecordRefreshBegin();
         if (!appliance::FetchUnits(membership)) {
+            appliance::RecordRefreshFailure(membership.domain, "no domain controller tells the organisational units");
             return VORN_FAIL(Unreachable);
         }
         return 0;

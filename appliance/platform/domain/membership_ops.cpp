@@ -2,6 +2,8 @@
 
 #include "appliance/platform/contract.h"
 //
+#include <chrono>
+#include <ctime>
 #include <string>
 #include <string_view>
 
@@ -12,6 +14,7 @@
 #include "appliance/base/text.h"
 #include "appliance/domain/join/machine_account.h"
 #include "appliance/domain/join/provisional.h"
+#include "appliance/domain/membership/last_test.h"
 #include "appliance/domain/membership/membership.h"
 #include "appliance/platform/domain/time_task.h"
 #include "appliance/platform/last_error.h"
@@ -66,6 +69,18 @@ bool ReadOrLog(Membership& membership) {
                                     (unnamed ? "no file that names a workgroup" : error.message()));
     }
     return !error;
+}
+
+// Asks the domain as one of this kind. `words` become the tool's.
+appliance::SecretState TestAndRecord(const Membership& membership, DomainKind kind, std::string& words) {
+    Membership asked = membership;
+    asked.kind = kind;
+    const auto began = std::chrono::steady_clock::now();
+    const appliance::SecretState state = appliance::TestSecret(asked, "", "", kTestDeadline, &words);
+    const auto took = std::chrono::steady_clock::now() - began;
+    appliance::RecordTest(membership, {std::time(nullptr), state == appliance::SecretState::Works,
+                                       std::chrono::duration_cast<std::chrono::milliseconds>(took).count()});
+    return state;
 }
 
 }  // namespace
@@ -127,13 +142,12 @@ int VORNWinsIsOwnDomain(const char* domain) {
 
 int VORNWinTestJoin(int ads) {
     VORN_GUARD(-1, {
-        Membership membership = MembershipOrNone();
+        const Membership membership = MembershipOrNone();
         if (!membership.Joined()) {
             return VORN_FAIL(NotMember);
         }
-        membership.kind = ads != 0 ? DomainKind::ActiveDirectory : DomainKind::Nt4;
         std::string words;
-        switch (appliance::TestSecret(membership, "", "", kTestDeadline, &words)) {
+        switch (TestAndRecord(membership, ads != 0 ? DomainKind::ActiveDirectory : DomainKind::Nt4, words)) {
             case appliance::SecretState::Works:
                 return 0;
             case appliance::SecretState::Refused:

@@ -102,6 +102,9 @@ Method Groups() {
 Method Domains() {
     return {kDirectoryApi, 1, "domains", seconds(30)};
 }
+Method Overview() {
+    return {kDirectoryApi, 1, "overview", seconds(30)};
+}
 Method RefreshProgress() {
     return {kDirectoryApi, 1, "refresh_progress", seconds(30)};
 }
@@ -114,13 +117,18 @@ Method Leave() {
 Method Events() {
     return {kEventLogApi, 1, "list", seconds(30)};
 }
+Method NewLink() {
+    return {"", 1, "/session/new-link", seconds(30)};
+}
 
 }  // namespace methods
 
 Client::Client(std::string socket, std::chrono::seconds deadline) : socket_(std::move(socket)), deadline_(deadline) {}
 
 std::unique_ptr<HttpCall> Client::Begin(const Method& method, Secret body) const {
-    const std::string target = "/webapi/" + method.api + "/" + std::to_string(method.version) + "/" + method.name;
+    const std::string target = method.api.empty()
+                                   ? method.name
+                                   : "/webapi/" + method.api + "/" + std::to_string(method.version) + "/" + method.name;
     const auto deadline = deadline_.count() > 0 ? deadline_ : method.deadline;
     return std::make_unique<HttpCall>(socket_, target, std::move(body), deadline);
 }

@@ -14,7 +14,8 @@
 
 namespace appliance::ctl {
 
-// A method, and how long its answer may take.
+// A method, and how long its answer may take. Without an API, `name` is the path of something that the server itself
+// serves.
 struct Method {
     std::string api;
     int version;
@@ -45,10 +46,12 @@ Method ScheduleSet();
 Method Users();
 Method Groups();
 Method Domains();
+Method Overview();
 Method RefreshProgress();
 Method JoinSteps();
 Method Leave();
 Method Events();
+Method NewLink();
 
 }  // namespace methods
 

@@ -46,6 +46,7 @@ Runner SetUpUsers(CLI::App& parser);
 Runner SetUpGroups(CLI::App& parser);
 Runner SetUpEvents(CLI::App& parser);
 Runner SetUpSteps(CLI::App& parser);
+Runner SetUpLink(CLI::App& parser);
 Runner SetUpExplain(CLI::App& parser);
 Runner SetUpCall(CLI::App& parser);
 Runner SetUpComplete(CLI::App& parser);

@@ -24,6 +24,14 @@ std::string DomainToLeave(const Context& context) {
     return TextOf(context.client.Call(methods::Get()).data, "domain_name");
 }
 
+// "The appliance's computer account NAS1$"; without the name when the appliance does not tell it.
+std::string AccountText(const Context& context) {
+    Json::Value overview;
+    context.client.TryCall(methods::Overview(), Json::Value(Json::objectValue), overview);
+    const std::string account = TextOf(overview, "computer_account");
+    return "The appliance's computer account" + (account.empty() ? "" : " " + Escape(account));
+}
+
 // True when the administrator wants it.
 bool Confirm(Context& context, const LeaveOptions& options, const std::string& domain) {
     if (options.yes) {
@@ -41,8 +49,9 @@ bool Confirm(Context& context, const LeaveOptions& options, const std::string& d
             "", 0,
             "The appliance leaves the domain " + Escape(domain) + ". Its users lose their access to the shares.");
     }
-    err.Line(options.deleteAccount ? "The appliance's computer account is deleted on the domain controller."
-                                   : "The appliance's computer account stays on the domain controller.");
+    err.Paragraph("", 0,
+                  AccountText(context) + (options.deleteAccount ? " is deleted on the domain controller."
+                                                                : " stays on the domain controller."));
     const std::string answer = Ask("Leave? [y/N] ");
     return answer == "y" || answer == "yes";
 }

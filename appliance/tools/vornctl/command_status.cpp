@@ -52,11 +52,35 @@ void AddLists(Context& context, const std::string& domain, Facts& facts) {
     facts.emplace_back("Local lists", text.empty() ? "none yet; \"vornctl refresh\" fetches them" : text);
 }
 
+std::string TestText(const Json::Value& test) {
+    if (!test.isObject()) {
+        return "none yet; \"vornctl test\" makes one";
+    }
+    return std::string(FlagOf(test, "success") ? "worked" : "failed") + ", " + TimeText(MemberOf(test, "time")) + ", " +
+           DurationText(MemberOf(test, "milliseconds"));
+}
+
+// A member's status says how its last test went, too, if the appliance tells.
+Json::Value AskOverview(Context& context, const Answer& answer) {
+    Json::Value overview;
+    if (answer.success && FlagOf(answer.data, "enable_domain")) {
+        context.client.TryCall(methods::Overview(), Json::Value(Json::objectValue), overview);
+    }
+    return overview;
+}
+
 int RunStatus(Context& context) {
-    Answer answer;
-    int exitCode = kDone;
-    if (!CallAndReport(context, methods::Get(), Json::Value(Json::objectValue), answer, exitCode) || context.json) {
-        return exitCode;
+    Answer answer = context.client.Call(methods::Get());
+    const Json::Value overview = AskOverview(context, answer);
+    if (context.json) {
+        if (overview.isObject()) {
+            answer.whole["data"]["last_test"] = MemberOf(overview, "last_test");
+        }
+        PrintJson(context, answer);
+        return answer.success ? kDone : kRefused;
+    }
+    if (!answer.success) {
+        return ReportRefusal(context, answer);
     }
     Output& out = context.out;
     const Json::Value& data = answer.data;
@@ -78,6 +102,9 @@ int RunStatus(Context& context) {
     facts.emplace_back("Trusted domains", NumberOf(data, "manage_mode") == 0 ? "used" : "not used");
     facts.emplace_back("DNS servers", dns);
     AddAdvancedOptions(options, facts);
+    if (overview.isObject()) {
+        facts.emplace_back("Last test", TestText(MemberOf(overview, "last_test")));
+    }
     AddLists(context, domain, facts);
     out.Facts(facts);
     return kDone;
@@ -120,7 +147,8 @@ int RunTest(Context& context) {
 Runner SetUpStatus(CLI::App& parser) {
     parser.footer(
         "Ends with 0 both for a member and for an appliance that is none. No controller\n"
-        "is asked: whether the membership works tells \"vornctl test\".");
+        "is asked: whether the membership works now tells \"vornctl test\"; what the last\n"
+        "test said is shown here.");
     return RunStatus;
 }
 

@@ -25,6 +25,7 @@ const std::vector<Command>& Commands() {
         {"groups", "Show the groups of a domain.", SetUpGroups},
         {"events", "Show what happened to the membership.", SetUpEvents},
         {"steps", "Show the steps of the last join or leave.", SetUpSteps},
+        {"link", "Make a link that logs in to the page once.", SetUpLink},
         {"explain", "Say what an error code means and what to do.", SetUpExplain},
         {"call", "Call any method of the web API.", SetUpCall},
         {"__complete", "", SetUpComplete, true},

@@ -8,6 +8,7 @@
 
 #include "appliance/base/error_code.h"
 #include "appliance/base/paths.h"
+#include "appliance/domain/membership/last_test.h"
 #include "platform/core.h"
 #include "platform/domain.h"
 #include "tests/appliance/join/join_test.h"
@@ -140,6 +141,70 @@ TEST_F(Operations, TheTestIsTheControllersWord) {
     Tool("/usr/bin/net", "echo \"Join to 'LAB' is OK\"");
     EXPECT_EQ(VORNWinTestJoin(0), 0);
     EXPECT_THAT(Calls().back(), HasSubstr("rpc testjoin"));
+}
+
+TEST_F(Operations, EveryTestOfAMemberIsKept) {
+    EXPECT_EQ(VORNWinTestJoin(1), -1);
+    EXPECT_FALSE(Exists(appliance::kLastTest));
+    MakeMember("ads", "LAB", "LAB.TEST");
+    appliance::Membership membership;
+    ASSERT_FALSE(appliance::ReadMembership(membership));
+    EXPECT_FALSE(appliance::ReadLastTest(membership));
+    struct Row {
+        const char* tool;
+        bool success;
+    };
+    for (const Row& row : {Row{"sleep 0.2; echo Join is OK", true}, Row{"exit 1", false},
+                           Row{"echo Preauthentication failed >&2; exit 255", false}, Row{"echo Join is OK", true}}) {
+        Tool("/usr/bin/net", row.tool);
+        const std::time_t before = time(nullptr);
+        EXPECT_EQ(VORNWinTestJoin(1), row.success ? 0 : -1);
+        const auto test = appliance::ReadLastTest(membership);
+        ASSERT_TRUE(test) << row.tool;
+        EXPECT_EQ(test->success, row.success) << row.tool;
+        EXPECT_GE(test->time, before);
+        EXPECT_LE(test->time, time(nullptr));
+        EXPECT_GE(test->milliseconds, strstr(row.tool, "sleep") != nullptr ? 200 : 0);
+        EXPECT_LT(test->milliseconds, 12000);
+    }
+    struct stat file {};
+    ASSERT_EQ(stat(At(appliance::kLastTest).c_str(), &file), 0);
+    EXPECT_EQ(file.st_mode & 07777, 0600U);
+    // Of another domain, or of none.
+    appliance::Membership other = membership;
+    other.domain = "OTHER";
+    EXPECT_FALSE(appliance::ReadLastTest(other));
+    Put(appliance::kSmbConf, kWorkgroupConf);
+    EXPECT_EQ(VORNWinTestJoin(1), -1);
+    ASSERT_FALSE(appliance::ReadMembership(other));
+    EXPECT_FALSE(appliance::ReadLastTest(other));
+}
+
+TEST_F(Operations, ATestThatCanNotBeKeptIsATestNevertheless) {
+    MakeMember("ads", "LAB", "LAB.TEST");
+    Tool("/usr/bin/net", "echo Join is OK");
+    std::filesystem::create_directories(At(appliance::kLastTest));
+    EXPECT_EQ(VORNWinTestJoin(1), 0);
+    rmdir(At(appliance::kLastTest).c_str());
+    appliance::Membership membership;
+    ASSERT_FALSE(appliance::ReadMembership(membership));
+    for (const char* record : {"", "{", "[]", "{\"time\":1}", "{\"time\":1,\"success\":1,\"milliseconds\":1}"}) {
+        Put(appliance::kLastTest, record);
+        EXPECT_FALSE(appliance::ReadLastTest(membership)) << record;
+    }
+    EXPECT_EQ(VORNWinTestJoin(1), 0);
+    EXPECT_TRUE(appliance::ReadLastTest(membership));
+    appliance::ForgetLastTest();
+    EXPECT_FALSE(Exists(appliance::kLastTest));
+}
+
+// What was tested is no longer there when the answer comes.
+TEST_F(Operations, ATestThatOutlivesItsMembershipIsNotKept) {
+    MakeMember("ads", "LAB", "LAB.TEST");
+    Put("/workgroup.conf", kWorkgroupConf);
+    Tool("/usr/bin/net", "cp $R/workgroup.conf $R/usr/vorn/etc/smb.conf; echo Join is OK");
+    EXPECT_EQ(VORNWinTestJoin(1), 0);
+    EXPECT_FALSE(Exists(appliance::kLastTest));
 }
 
 TEST_F(Operations, AControllerThatIsBackIsAskedThoughSambaLeavesItAlone) {
