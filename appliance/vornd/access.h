@@ -7,6 +7,7 @@
 #include <sys/types.h>
 
 #include <optional>
+#include <string>
 
 namespace appliance {
 
@@ -19,14 +20,21 @@ struct Peer {
 // Nothing when the kernel does not say.
 std::optional<Peer> PeerOf(int socket);
 
+// In rising order.
 enum class Access {
-    None,           // every request is answered with NotAllowed
+    None,           // the server's figures, and nothing else
+    Door,           // to log in; with the session of an administrator what an administrator may
     Administrator,  // everything
 };
 
-// What a peer may do by itself. This is the one place that decides it: a process without rights that hands on requests
-// of users who have logged in gets a case of its own here, and its requests are judged by their session then.
-Access AccessOf(const Peer& peer);
+// The account of the server that stands between browsers and this one.
+inline constexpr const char kDoorAccount[] = "vorn-httpd";
+
+// The id of an account that may be the door: nothing when the system does not know it, or when it is root's.
+std::optional<uid_t> FindDoor(const std::string& account);
+
+// What a peer may do by itself. This is the one place that decides it.
+Access AccessOf(const Peer& peer, std::optional<uid_t> door);
 
 }  // namespace appliance
 

@@ -2,6 +2,7 @@
 
 #include <string.h>
 
+#include <algorithm>
 #include <boost/asio/buffer.hpp>
 #include <boost/asio/executor_work_guard.hpp>
 #include <boost/asio/post.hpp>
@@ -28,9 +29,11 @@ constexpr std::size_t kBufferLimit = 2 * kHeaderLimit;
 
 constexpr std::string_view kContinue = "HTTP/1.1 100 Continue\r\n\r\n";
 
-Reply ExecuteSafely(const Router& router, const Call& call) {
+// What `make` answers; an exception is an answer, too.
+template <typename Maker>
+auto Safely(const Maker& make) -> decltype(make()) {
     try {
-        return router.Execute(call);
+        return make();
     } catch (const std::exception& error) {
         Log(LOG_ERR, std::string("an answer could not be made: ") + error.what());
         return ErrorReply(ServerCode::ModuleException);
@@ -39,12 +42,8 @@ Reply ExecuteSafely(const Router& router, const Call& call) {
 
 }  // namespace
 
-Connection::Connection(Socket socket, const Peer& peer, const Services& services)
-    : socket_(std::move(socket)),
-      access_(AccessOf(peer)),
-      services_(services),
-      timer_(services.loop),
-      buffer_(kBufferLimit) {}
+Connection::Connection(Socket socket, Access access, const Services& services)
+    : socket_(std::move(socket)), access_(access), services_(services), timer_(services.loop), buffer_(kBufferLimit) {}
 
 void Connection::Start() {
     WaitForRequest();
@@ -71,6 +70,7 @@ void Connection::WaitForRequest() {
 
 void Connection::ReadHeader() {
     state_ = State::Reading;
+    complete_ = std::chrono::steady_clock::now();
     LimitTime(kSendLimit);
     parser_.emplace();
     parser_->header_limit(static_cast<std::uint32_t>(kHeaderLimit));
@@ -94,11 +94,11 @@ void Connection::OnHeader(Error error, std::size_t size) {
         return;
     }
     const http::request_header<>& header = parser_->get().base();
-    if (!HasSoundFraming(header)) {
+    if (!HasSoundFraming(header) || !ReadMarks(header, request_.marks)) {
         Answer(ErrorReply(ServerCode::BadRequest), false);
         return;
     }
-    if (access_ == Access::None) {
+    if (!Gate::MayEnter(access_, header.method_string(), header.target())) {
         Answer(ErrorReply(ServerCode::NotAllowed), false);
         return;
     }
@@ -143,11 +143,12 @@ void Connection::OnRequest(Error error) {
         return;
     }
     timer_.cancel();
+    complete_ = std::chrono::steady_clock::now();
     request_.body = std::move(parser_->get().body());
-    std::variant<Reply, Call> next = services_.router.Route(request_);
+    Next next = Safely([this] { return services_.gate.Take(access_, request_); });
     WipeRequest();
-    if (Call* call = std::get_if<Call>(&next)) {
-        Dispatch(std::move(*call));
+    if (Work* work = std::get_if<Work>(&next)) {
+        Dispatch(std::move(*work));
     } else {
         Answer(std::move(std::get<Reply>(next)), keepOpen_);
     }
@@ -179,36 +180,62 @@ void Connection::OnReadError(Error error) {
     }
 }
 
-void Connection::Dispatch(Call call) {
+void Connection::Dispatch(Work work) {
     state_ = State::Calling;
     const auto self = shared_from_this();
+    const auto shared = std::make_shared<const Work>(std::move(work));
     // The loop has something to wait for until the answer is there.
-    const auto answer = [self, work = asio::make_work_guard(services_.loop)](Reply reply, bool keepOpen) {
-        asio::post(self->services_.loop, [self, keepOpen, reply = std::move(reply)]() mutable {
-            self->Answer(std::move(reply), keepOpen && self->keepOpen_);
+    const auto answer = [self, shared, guard = asio::make_work_guard(services_.loop)](Reply reply, bool keepOpen) {
+        asio::post(self->services_.loop, [self, shared, keepOpen, reply = std::move(reply)]() mutable {
+            self->Finish(*shared, std::move(reply), keepOpen && self->keepOpen_);
         });
     };
     WorkerPool::Job job;
-    job.run = [self, answer, call = std::make_shared<const Call>(std::move(call))] {
-        answer(ExecuteSafely(self->services_.router, *call), true);
-    };
+    job.run = [shared, answer] { answer(Safely(shared->run), true); };
     job.refuse = [answer] { answer(ErrorReply(ServerCode::Ending), false); };
-    if (!services_.pool.Submit(job)) {
-        Answer(ErrorReply(draining_ ? ServerCode::Ending : ServerCode::QueueFull), !draining_ && keepOpen_);
+    if (!services_.lanes[shared->lane].Submit(job)) {
+        Finish(*shared, ErrorReply(draining_ ? ServerCode::Ending : ServerCode::QueueFull), !draining_ && keepOpen_);
     }
 }
 
+void Connection::Finish(const Work& work, Reply reply, bool keepOpen) {
+    // Also when the client has gone: what was begun for it has to be brought to its end.
+    Answer(Safely([&] { return work.finish(std::move(reply)); }), keepOpen);
+}
+
 void Connection::Answer(Reply reply, bool keepOpen) {
+    using std::chrono::steady_clock;
+    const auto due = std::max(steady_clock::now(), reply.notBefore);
+    services_.metrics.Count(reply, std::chrono::duration_cast<std::chrono::microseconds>(due - complete_));
     if (state_ == State::Closed) {
         return;
     }
+    keepOpen_ = keepOpen;
+    if (due != reply.notBefore) {
+        Send(std::move(reply));
+        return;
+    }
+    state_ = State::Calling;
+    timer_.expires_at(due);
+    timer_.async_wait([self = shared_from_this(), reply = std::move(reply)](Error error) mutable {
+        if (!error && self->state_ == State::Calling) {
+            self->Send(std::move(reply));
+        }
+    });
+}
+
+void Connection::Send(Reply reply) {
     state_ = State::Answering;
-    keepOpen_ = keepOpen && !draining_;
+    keepOpen_ = keepOpen_ && !draining_;
+    answerIsSecret_ = reply.isSecret;
     response_.emplace(static_cast<http::status>(reply.status), 11u);
-    response_->set(http::field::content_type, "application/json");
+    response_->set(http::field::content_type, reply.type);
     response_->set(http::field::cache_control, "no-store");
     if (reply.allow != nullptr) {
         response_->set(http::field::allow, reply.allow);
+    }
+    if (reply.retryAfter > 0) {
+        response_->set(http::field::retry_after, std::to_string(reply.retryAfter));
     }
     response_->body() = std::move(reply.body);
     response_->keep_alive(keepOpen_);
@@ -221,6 +248,9 @@ void Connection::Answer(Reply reply, bool keepOpen) {
 void Connection::OnAnswered(Error error) {
     if (state_ != State::Answering) {
         return;
+    }
+    if (answerIsSecret_) {
+        explicit_bzero(response_->body().data(), response_->body().size());
     }
     response_.reset();
     parser_.reset();

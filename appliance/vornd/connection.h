@@ -18,8 +18,8 @@
 #include <string_view>
 
 #include "appliance/vornd/access.h"
-#include "appliance/vornd/router.h"
-#include "appliance/vornd/worker_pool.h"
+#include "appliance/vornd/gate.h"
+#include "appliance/vornd/lanes.h"
 
 namespace appliance {
 
@@ -30,12 +30,13 @@ public:
     // What a connection needs of its server; outlives it.
     struct Services {
         boost::asio::io_context& loop;
-        const Router& router;
-        WorkerPool& pool;
+        Gate& gate;
+        Lanes& lanes;
+        Metrics& metrics;
         std::function<void(Connection&)> closed;  // called once, at its end
     };
 
-    Connection(Socket socket, const Peer& peer, const Services& services);
+    Connection(Socket socket, Access access, const Services& services);
 
     void Start();
 
@@ -68,8 +69,10 @@ private:
     void ReadBody();
     void OnRequest(Error error);
     void OnReadError(Error error);
-    void Dispatch(Call call);
+    void Dispatch(Work work);
+    void Finish(const Work& work, Reply reply, bool keepOpen);
     void Answer(Reply reply, bool keepOpen);
+    void Send(Reply reply);
     void OnAnswered(Error error);
     void Linger();
     void LimitTime(std::chrono::milliseconds limit);
@@ -83,11 +86,13 @@ private:
     bool draining_ = false;
     bool keepOpen_ = false;
     std::chrono::steady_clock::time_point idleSince_;
+    std::chrono::steady_clock::time_point complete_;  // when the present request was
     boost::asio::steady_timer timer_;
     boost::beast::flat_buffer buffer_;
     std::optional<boost::beast::http::request_parser<Body>> parser_;
     std::optional<boost::beast::http::response<Body>> response_;
     WebRequest request_;
+    bool answerIsSecret_ = false;
 };
 
 }  // namespace appliance

@@ -15,15 +15,16 @@
 
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
+#include "appliance/vornd/access.h"
 #include "appliance/vornd/descriptions.h"
 #include "appliance/vornd/listener.h"
 #include "appliance/vornd/method_table.h"
-#include "appliance/vornd/notify.h"
 #include "appliance/vornd/options.h"
 #include "appliance/vornd/router.h"
 #include "appliance/vornd/server.h"
 #include "appliance/vornd/startup.h"
 #include "appliance/vornd/task_main.h"
+#include "appliance/web/notify.h"
 
 namespace appliance {
 namespace {
@@ -34,8 +35,7 @@ constexpr const char* kDescriptions = "/usr/vorn/share/methods.json";
 
 // An error of the start: to the log, and to standard error wherever that leads.
 void Complain(const std::string& line) {
-    closelog();
-    openlog("vornd", LOG_PID, LOG_DAEMON);
+    LogWithoutWaiting("vornd", false);
     Log(LOG_ERR, line);
     static_cast<void>(std::fprintf(stderr, "vornd: %s\n", line.c_str()));
 }
@@ -109,7 +109,7 @@ int Serve(const Options& options) {
     LoadModules(options, table);
     RepairLeftovers();
     const Router router(table, ReadDescriptions(Path(kDescriptions)), HostOf(options));
-    const auto server = std::make_unique<Server>(std::move(listener.socket), path, router);
+    const auto server = std::make_unique<Server>(std::move(listener.socket), path, router, FindDoor(options.door));
     guard.Served();
     Log(LOG_NOTICE, std::string("version " VORN_VERSION " serves ") + std::to_string(table.apis().size()) +
                         " APIs of " + std::to_string(table.ModuleCount()) + " modules on " + path);
@@ -164,7 +164,9 @@ int Main(int count, char** arguments) {
     }
     CloseForeignDescriptors();
     const bool terminal = options.foreground || isatty(STDERR_FILENO) != 0;
+    // The module calls syslog itself.
     openlog("vornd", LOG_PID | (terminal ? LOG_PERROR : 0), LOG_DAEMON);
+    LogWithoutWaiting("vornd", terminal);
     umask(022);
     SetRoot(options.root);
     // Passwords pass through this memory.

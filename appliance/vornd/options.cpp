@@ -13,6 +13,7 @@ const char* const kHelp =
     "  --foreground    log to the terminal, too, also when standard error is none\n"
     "  --socket FILE   listen on FILE instead of /run/vorn/vornd.sock\n"
     "  --module FILE   load FILE beside the modules in /usr/vorn/lib/modules; may be given several times\n"
+    "  --door ACCOUNT  whose processes may log administrators in, instead of vorn-httpd; for tests\n"
     "  --root FOLDER   look for the appliance's files under FOLDER; for tests\n"
     "  --task ID       run the recorded background task ID and end; used by the server itself\n"
     "  --help          show this text and end\n"
@@ -22,10 +23,11 @@ const char* const kHelp =
     "Exit status: 0 ended in order, 1 could not start or left calls behind, 2 wrong command line.\n";
 
 bool ParseOptions(int count, char** arguments, Options& options, std::string& reason) {
-    enum Option : int { Foreground = 256, Socket, ModuleFile, Root, Task, Help, Version };
-    const std::array<option, 8> known{{{"foreground", no_argument, nullptr, Foreground},
+    enum Option : int { Foreground = 256, Socket, ModuleFile, Door, Root, Task, Help, Version };
+    const std::array<option, 9> known{{{"foreground", no_argument, nullptr, Foreground},
                                        {"socket", required_argument, nullptr, Socket},
                                        {"module", required_argument, nullptr, ModuleFile},
+                                       {"door", required_argument, nullptr, Door},
                                        {"root", required_argument, nullptr, Root},
                                        {"task", required_argument, nullptr, Task},
                                        {"help", no_argument, nullptr, Help},
@@ -53,6 +55,9 @@ bool ParseOptions(int count, char** arguments, Options& options, std::string& re
                 break;
             case ModuleFile:
                 options.modules.emplace_back(optarg);
+                break;
+            case Door:
+                options.door = optarg;
                 break;
             case Root:
                 options.root = optarg;

@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+#include "appliance/vornd/access.h"
+
 namespace appliance {
 
 struct Options {
@@ -14,6 +16,7 @@ struct Options {
     bool foreground = false;
     std::string root;    // in front of all fixed paths; for tests
     std::string socket;  // empty: the appliance's own
+    std::string door = kDoorAccount;
     std::vector<std::string> modules;
     std::string task;  // id of a recorded task
 };

@@ -18,6 +18,7 @@ namespace {
 
 constexpr std::string_view kRootPath = "/webapi";
 constexpr std::string_view kOpenApiPath = "/webapi/openapi.json";
+constexpr const char* kDescriptionsApi = "webapi";
 constexpr std::int32_t kHighestVersion = 999999;
 
 std::optional<std::int32_t> ParseVersion(std::string_view text) {
@@ -35,29 +36,18 @@ bool IsJsonType(std::string_view type) {
     return EqualIgnoringCase(Trim(type.substr(0, type.find(';'))), "application/json");
 }
 
-std::string SuccessBody(const Json::Value& data) {
-    Json::Value answer(Json::objectValue);
-    answer["success"] = true;
-    answer["data"] = data;
-    return WriteJson(answer);
-}
-
-std::string FailureBody(int code, const Json::Value& errors) {
-    Json::Value answer(Json::objectValue);
-    answer["success"] = false;
-    answer["error"]["code"] = code;
-    answer["error"]["errors"] = errors;
-    return WriteJson(answer);
-}
-
 std::string NameOf(const VORN::APIEntry& method) {
     return std::string(method.api) + "/" + std::to_string(method.version) + "/" + method.method;
 }
 
 }  // namespace
 
-Reply ErrorReply(ServerCode code, const char* allow) {
-    return {HttpStatus(code), FailureBody(static_cast<int>(code), Describe(code)), allow};
+std::optional<ServerCode> ReadBody(const WebRequest& request, Json::Value& parameters) {
+    const bool needsType = !request.body.empty() || request.hasContentType;
+    if ((needsType && !IsJsonType(request.contentType)) || request.hasContentEncoding) {
+        return ServerCode::WrongType;
+    }
+    return ReadParameters(request.body, parameters);
 }
 
 Router::Router(const MethodTable& methods, const Json::Value& descriptions, TaskHost taskHost)
@@ -73,7 +63,11 @@ std::variant<Reply, Call> Router::Route(const WebRequest& request) const {
         if (request.verb != "GET") {
             return ErrorReply(ServerCode::WrongVerb, "GET");
         }
-        return Reply{200, isList ? list_ : openApi_, nullptr};
+        Reply reply;
+        reply.body = isList ? list_ : openApi_;
+        reply.api = kDescriptionsApi;
+        reply.method = isList ? "list" : "openapi";
+        return reply;
     }
     if (target.size() <= kRootPath.size() + 1 || !StartsWith(target, kRootPath) || target[kRootPath.size()] != '/') {
         return ErrorReply(ServerCode::NoSuchPage);
@@ -96,11 +90,7 @@ std::variant<Reply, Call> Router::RouteCall(std::string_view path, const WebRequ
     if (request.verb != "POST") {
         return ErrorReply(ServerCode::WrongVerb, "POST");
     }
-    const bool needsType = !request.body.empty() || request.hasContentType;
-    if ((needsType && !IsJsonType(request.contentType)) || request.hasContentEncoding) {
-        return ErrorReply(ServerCode::WrongType);
-    }
-    if (const std::optional<ServerCode> wrong = ReadParameters(request.body, call.parameters)) {
+    if (const std::optional<ServerCode> wrong = ReadBody(request, call.parameters)) {
         return ErrorReply(*wrong);
     }
     return call;
@@ -126,12 +116,12 @@ Reply Router::Execute(const Call& call) const {
         return ErrorReply(ServerCode::NoAnswer);
     }
     if (response.impl->success) {
-        return {200, SuccessBody(response.impl->data), nullptr};
+        return SuccessReply(response.impl->data);
     }
     const auto took = std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now() - begin);
     Log(LOG_NOTICE, NameOf(*call.method) + ": answered with error " + std::to_string(response.impl->code) + " after " +
                         std::to_string(took.count()) + " ms");
-    return {200, FailureBody(response.impl->code, response.impl->errors), nullptr};
+    return FailureReply(response.impl->code, response.impl->errors);
 }
 
 }  // namespace appliance

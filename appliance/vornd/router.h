@@ -5,25 +5,17 @@
 
 #include <json/value.h>
 
+#include <optional>
 #include <string>
 #include <string_view>
 #include <variant>
 
 #include "appliance/platform/webapi/task_process.h"
+#include "appliance/vornd/door_marks.h"
 #include "appliance/vornd/method_table.h"
-#include "appliance/web/server_codes.h"
+#include "appliance/vornd/reply.h"
 
 namespace appliance {
-
-// An answer: always a JSON text.
-struct Reply {
-    int status = 200;
-    std::string body;
-    const char* allow = nullptr;  // of WrongVerb: the HTTP method that is right
-};
-
-// The server's own answer to what it does not serve: {"success": false, "error": {"code": N, "errors": TEXT}}.
-Reply ErrorReply(ServerCode code, const char* allow = nullptr);
 
 // A request as it was sent, with its body complete.
 struct WebRequest {
@@ -32,8 +24,12 @@ struct WebRequest {
     bool hasContentType = false;
     std::string contentType;
     bool hasContentEncoding = false;
+    DoorMarks marks;
     std::string body;
 };
+
+// Reads the body of a POST request that takes parameters. Answers what is wrong with it, or nothing.
+std::optional<ServerCode> ReadBody(const WebRequest& request, Json::Value& parameters);
 
 // A method to be called with these parameters.
 struct Call {

@@ -10,8 +10,10 @@
 #include <vector>
 
 #include "appliance/base/log.h"
-#include "appliance/vornd/notify.h"
+#include "appliance/base/paths.h"
+#include "appliance/vornd/authenticator.h"
 #include "appliance/web/limits.h"
+#include "appliance/web/notify.h"
 
 namespace appliance {
 namespace {
@@ -34,11 +36,14 @@ void Refuse(const FileDescriptor& descriptor, ServerCode code) {
 
 }  // namespace
 
-Server::Server(FileDescriptor listener, std::string path, const Router& router)
-    : services_{loop_, router, pool_, [this](Connection& connection) { connections_.erase(&connection); }},
-      pool_(kWorkers, kWaitingCalls),
+Server::Server(FileDescriptor listener, std::string path, const Router& router, std::optional<uid_t> door)
+    : sessions_(Path(kSessions), SessionClock::OfTheMachine()),
+      sessionRoutes_(sessions_, SessionClock::OfTheMachine(), Authenticate),
+      gate_({router, sessions_, sessionRoutes_, metrics_, [this] { return ReadGauges(); }}),
+      services_{loop_, gate_, lanes_, metrics_, [this](Connection& connection) { connections_.erase(&connection); }},
       listener_(loop_, Protocol(), listener.Release()),
       path_(std::move(path)),
+      door_(door),
       signals_(loop_, SIGTERM, SIGINT, SIGHUP),
       pause_(loop_),
       beat_(loop_),
@@ -50,6 +55,7 @@ bool Server::Run() {
     Beat();
     Notify("READY=1");
     loop_.run();
+    sessions_.Save();
     return !leftBehind_;
 }
 
@@ -88,7 +94,8 @@ void Server::Take(FileDescriptor descriptor) {
     if (!peer) {
         return;
     }
-    if (connections_.size() >= kConnections && !MakeRoom(AccessOf(*peer))) {
+    const Access access = AccessOf(*peer, door_);
+    if (!MakeRoom(access)) {
         Refuse(descriptor, ServerCode::TooManyConnections);
         return;
     }
@@ -99,24 +106,33 @@ void Server::Take(FileDescriptor descriptor) {
         return;
     }
     descriptor.Release();
-    const auto connection = std::make_shared<Connection>(std::move(socket), *peer, services_);
+    const auto connection = std::make_shared<Connection>(std::move(socket), access, services_);
     connections_.emplace(connection.get(), connection);
     connection->Start();
 }
 
-// The oldest idle connection goes. One without rights never pushes the administrator's out, and it goes first itself.
+// The oldest idle connection goes, of those with the least rights first. None pushes out one that has more rights than
+// itself; one without any goes even while it is served. The door never has them all: whoever holds it can't keep the
+// administrator out.
 bool Server::MakeRoom(Access newcomer) {
+    std::size_t doors = 0;
+    for (const auto& [connection, owner] : connections_) {
+        if (connection->access() == Access::Door) {
+            ++doors;
+        }
+    }
+    const bool tooManyDoors = newcomer == Access::Door && doors >= kDoorConnections;
+    if (connections_.size() < kConnections && !tooManyDoors) {
+        return true;
+    }
     Connection* oldest = nullptr;
     const auto goesBefore = [](const Connection& first, const Connection& second) {
-        if (first.access() != second.access()) {
-            return first.access() == Access::None;
-        }
-        return first.idleSince() < second.idleSince();
+        return std::make_pair(first.access(), first.idleSince()) < std::make_pair(second.access(), second.idleSince());
     };
     for (const auto& [connection, owner] : connections_) {
-        const bool mayGo = connection->access() == Access::None || newcomer == Access::Administrator;
-        const bool isFree =
-            connection->IsIdle() || (connection->access() == Access::None && newcomer == Access::Administrator);
+        const Access access = connection->access();
+        const bool mayGo = tooManyDoors ? access == Access::Door : access <= newcomer;
+        const bool isFree = connection->IsIdle() || (access == Access::None && newcomer != Access::None);
         if (mayGo && isFree && (oldest == nullptr || goesBefore(*connection, *oldest))) {
             oldest = connection;
         }
@@ -128,6 +144,13 @@ bool Server::MakeRoom(Access newcomer) {
     return true;
 }
 
+Metrics::Gauges Server::ReadGauges() {
+    const WorkerPool& calls = lanes_[Lane::Calls];
+    const WorkerPool& logIns = lanes_[Lane::LogIns];
+    return {calls.Running(),  calls.Waiting(),     logIns.Running(),
+            logIns.Waiting(), connections_.size(), sessions_.Count()};
+}
+
 void Server::WaitForSignal() {
     signals_.async_wait([this](Error error, int signal) {
         if (error) {
@@ -135,10 +158,10 @@ void Server::WaitForSignal() {
         }
         if (!draining_) {
             Log(LOG_NOTICE,
-                "ending on signal " + std::to_string(signal) + "; " + std::to_string(pool_.Running()) + " calls run");
+                "ending on signal " + std::to_string(signal) + "; " + std::to_string(lanes_.Running()) + " calls run");
             Drain();
         } else {
-            Log(LOG_NOTICE, "waiting for " + std::to_string(pool_.Running()) + " calls");
+            Log(LOG_NOTICE, "waiting for " + std::to_string(lanes_.Running()) + " calls");
         }
         WaitForSignal();
     });
@@ -152,7 +175,7 @@ void Server::Drain() {
     Error ignored;
     listener_.close(ignored);
     pause_.cancel();
-    pool_.Drain();
+    lanes_.Drain();
     std::vector<std::shared_ptr<Connection>> connections;
     for (const auto& [connection, owner] : connections_) {
         connections.push_back(owner);
@@ -163,7 +186,7 @@ void Server::Drain() {
     drainLimit_.expires_after(kDrainLimit);
     drainLimit_.async_wait([this](Error error) {
         if (!error) {
-            Log(LOG_ERR, std::to_string(pool_.Running()) + " calls did not end and are left behind");
+            Log(LOG_ERR, std::to_string(lanes_.Running()) + " calls did not end and are left behind");
             leftBehind_ = true;
             loop_.stop();
         }
@@ -178,7 +201,7 @@ void Server::FinishWhenDone() {
         if (error) {
             return;
         }
-        if (connections_.empty() && pool_.Running() == 0) {
+        if (connections_.empty() && lanes_.Running() == 0) {
             loop_.stop();
         } else {
             FinishWhenDone();

@@ -8,21 +8,26 @@
 #include <boost/asio/signal_set.hpp>
 #include <boost/asio/steady_timer.hpp>
 #include <memory>
+#include <optional>
 #include <string>
 #include <unordered_map>
 
 #include "appliance/base/file.h"
 #include "appliance/vornd/connection.h"
+#include "appliance/vornd/gate.h"
+#include "appliance/vornd/lanes.h"
+#include "appliance/vornd/metrics.h"
 #include "appliance/vornd/router.h"
-#include "appliance/vornd/worker_pool.h"
+#include "appliance/vornd/session_routes.h"
+#include "appliance/vornd/session_store.h"
 
 namespace appliance {
 
 class Server {
 public:
     // `listener` is a listening, non-blocking socket; `path` its file, which goes when the server begins to end.
-    // `router` outlives the server.
-    Server(FileDescriptor listener, std::string path, const Router& router);
+    // `router` outlives the server. `door` is the user who may log administrators in, when there is one.
+    Server(FileDescriptor listener, std::string path, const Router& router, std::optional<uid_t> door);
     Server(const Server&) = delete;
     Server& operator=(const Server&) = delete;
 
@@ -35,17 +40,23 @@ private:
     void TakeConnections();
     void Take(FileDescriptor descriptor);
     bool MakeRoom(Access newcomer);
+    Metrics::Gauges ReadGauges();
     void WaitForSignal();
     void Drain();
     void FinishWhenDone();
     void Beat();
 
     boost::asio::io_context loop_;
+    Metrics metrics_;
+    SessionStore sessions_;
+    SessionRoutes sessionRoutes_;
+    Gate gate_;
     Connection::Services services_;
-    // The last owner of a connection may be a job, so the pool ends before the loop, and the connections before it.
-    WorkerPool pool_;
+    // The last owner of a connection may be a job, so the threads end before the loop, and the connections before them.
+    Lanes lanes_;
     boost::asio::local::stream_protocol::acceptor listener_;
     const std::string path_;
+    const std::optional<uid_t> door_;
     boost::asio::signal_set signals_;
     boost::asio::steady_timer pause_;
     boost::asio::steady_timer beat_;

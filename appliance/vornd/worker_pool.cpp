@@ -48,6 +48,11 @@ std::size_t WorkerPool::Running() const {
     return running_;
 }
 
+std::size_t WorkerPool::Waiting() const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    return waiting_.size();
+}
+
 void WorkerPool::Work() {
     std::unique_lock<std::mutex> lock(mutex_);
     for (;;) {

@@ -34,8 +34,9 @@ public:
     // Refuses what waits and takes no more. What runs goes on.
     void Drain();
 
-    // How many jobs run.
+    // How many jobs run, and how many wait.
     std::size_t Running() const;
+    std::size_t Waiting() const;
 
 private:
     void Work();

@@ -12,6 +12,7 @@ inline constexpr std::size_t kHeaderLimit = std::size_t{8} << 10;  // bytes
 inline constexpr std::size_t kBodyLimit = std::size_t{64} << 10;   // bytes
 inline constexpr int kJsonDepth = 10;                              // levels of arrays and objects
 inline constexpr std::size_t kConnections = 256;
+inline constexpr std::size_t kDoorConnections = 192;  // of them, of the server in front
 inline constexpr std::size_t kWaitingCalls = 64;
 inline constexpr std::size_t kWorkers = 16;  // calls that run at a time
 

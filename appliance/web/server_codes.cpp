@@ -11,9 +11,16 @@ int HttpStatus(ServerCode code) {
         case ServerCode::JsonTooDeep:
         case ServerCode::DuplicateKey:
         case ServerCode::NoObject:
+        case ServerCode::BadParameter:
             return 400;
         case ServerCode::NotAllowed:
+        case ServerCode::NoSession:
+        case ServerCode::WrongCredentials:
+        case ServerCode::BadLink:
             return 401;
+        case ServerCode::WrongCsrfToken:
+        case ServerCode::CrossSite:
+            return 403;
         case ServerCode::NoSuchApi:
         case ServerCode::NoSuchMethod:
         case ServerCode::NoSuchVersion:
@@ -28,12 +35,16 @@ int HttpStatus(ServerCode code) {
             return 413;
         case ServerCode::WrongType:
             return 415;
+        case ServerCode::TooManyAttempts:
+            return 429;
         case ServerCode::ModuleException:
         case ServerCode::NoAnswer:
             return 500;
         case ServerCode::QueueFull:
         case ServerCode::Ending:
         case ServerCode::TooManyConnections:
+        case ServerCode::LogInImpossible:
+        case ServerCode::ServerUnreachable:
             return 503;
     }
     return 500;
@@ -53,6 +64,8 @@ std::string Describe(ServerCode code) {
             return "the body is no JSON object";
         case ServerCode::NotAllowed:
             return "only the administrator may call this server";
+        case ServerCode::BadParameter:
+            return "a parameter is missing or of the wrong type";
         case ServerCode::NoSuchApi:
             return "no such API";
         case ServerCode::NoSuchMethod:
@@ -71,6 +84,18 @@ std::string Describe(ServerCode code) {
             return "the body is larger than " + std::to_string(kBodyLimit) + " bytes";
         case ServerCode::WrongType:
             return "the body must be of type application/json";
+        case ServerCode::NoSession:
+            return "no session, or it has ended";
+        case ServerCode::WrongCsrfToken:
+            return "the request does not carry the token of its session";
+        case ServerCode::WrongCredentials:
+            return "wrong user or password, or no administrator";
+        case ServerCode::TooManyAttempts:
+            return "too many log-ins have failed; try again later";
+        case ServerCode::BadLink:
+            return "the link is used up, too old or wrong";
+        case ServerCode::LogInImpossible:
+            return "nobody can log in now; the log has more";
         case ServerCode::ModuleException:
             return "the module failed; the log has more";
         case ServerCode::NoAnswer:
@@ -81,6 +106,10 @@ std::string Describe(ServerCode code) {
             return "the server is ending";
         case ServerCode::TooManyConnections:
             return "too many connections";
+        case ServerCode::ServerUnreachable:
+            return "the appliance's server does not answer";
+        case ServerCode::CrossSite:
+            return "a page of another address sent the request";
     }
     return "unknown";
 }

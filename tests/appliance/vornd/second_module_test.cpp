@@ -11,6 +11,7 @@
 #include "appliance/module/directory_api.h"
 #include "appliance/module/event_api.h"
 #include "appliance/module/leave_api.h"
+#include "appliance/module/overview_api.h"
 #include "appliance/platform/system/event_log.h"
 #include "appliance/platform/webapi/exchange.h"
 #include "appliance/vornd/module.h"
@@ -235,7 +236,7 @@ TEST(SecondModuleFileTest, LoadsBesideTheFirstAndExportsItsTableOnly) {
     EXPECT_TRUE(first) << reason;
     const auto second = appliance::Module::Load(VORN_SECOND_MODULE, reason);
     ASSERT_TRUE(second) << reason;
-    EXPECT_EQ(second->entries().size(), 7u);
+    EXPECT_EQ(second->entries().size(), 8u);
     EXPECT_EQ(second->FindTask("_ZN9appliance5UsersERKNS_10ParametersE"), nullptr);
     // Each answers its own table, though both have the same name.
     EXPECT_STREQ(first->entries()[0].api, "VORN.Core.Directory.Domain");

@@ -9,6 +9,7 @@
 #include <spawn.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/un.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -50,6 +51,30 @@ bool Readable(int descriptor, Clock::time_point end) {
     pollfd waited{descriptor, POLLIN, 0};
     return poll(&waited, 1, left > 0 ? static_cast<int>(left) : 0) > 0;
 }
+
+// This thread's user, and no other thread's: the library's function would change all of them.
+class ThreadsUser {
+public:
+    explicit ThreadsUser(uid_t user) : changed_(user != geteuid()) {
+        if (changed_ && !Set(user)) {
+            throw std::runtime_error("the user can't be changed");
+        }
+    }
+    ~ThreadsUser() {
+        if (changed_) {
+            Set(0);
+        }
+    }
+    ThreadsUser(const ThreadsUser&) = delete;
+    ThreadsUser& operator=(const ThreadsUser&) = delete;
+
+private:
+    static bool Set(uid_t user) {
+        return syscall(SYS_setresuid, -1, user, -1) == 0;
+    }
+
+    const bool changed_;
+};
 
 Json::Value Parse(const std::string& text) {
     Json::Value value;
@@ -118,8 +143,9 @@ const Json::Value& Response::Data() const {
     return json["data"];
 }
 
-Client::Client(const std::string& socket) : socket_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+Client::Client(const std::string& socket, uid_t user) : socket_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
     const sockaddr_un address = AddressOf(socket);
+    const ThreadsUser as(geteuid() == 0 ? user : geteuid());
     if (connect(socket_.get(), Plain(address), sizeof address) != 0) {
         socket_.Reset();
     }
@@ -268,8 +294,8 @@ std::string Server::Errors() const {
     return content.str();
 }
 
-Client Server::Connect() const {
-    return Client(socket_);
+Client Server::Connect(uid_t user) const {
+    return Client(socket_, user);
 }
 
 Response Server::Call(const std::string& method, const Json::Value& parameters) const {

@@ -61,7 +61,8 @@ struct Response {
 // A connection.
 class Client {
 public:
-    explicit Client(const std::string& socket);
+    // As a process of this user would connect.
+    explicit Client(const std::string& socket, uid_t user = 0);
     bool connected() const {
         return static_cast<bool>(socket_);
     }
@@ -103,7 +104,7 @@ public:
 
     // One call on a connection of its own.
     Response Call(const std::string& method, const Json::Value& parameters = Json::Value(Json::objectValue)) const;
-    Client Connect() const;
+    Client Connect(uid_t user = 0) const;
     int Descriptors() const;
 
 private:

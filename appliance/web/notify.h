@@ -1,7 +1,7 @@
 // What the service manager wants to hear. Without one, none of this does anything.
 
-#ifndef VORN_APPLIANCE_VORND_NOTIFY_H
-#define VORN_APPLIANCE_VORND_NOTIFY_H
+#ifndef VORN_APPLIANCE_WEB_NOTIFY_H
+#define VORN_APPLIANCE_WEB_NOTIFY_H
 
 #include <chrono>
 #include <string>

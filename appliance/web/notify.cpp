@@ -1,4 +1,4 @@
-#include "appliance/vornd/notify.h"
+#include "appliance/web/notify.h"
 
 #include <stdlib.h>
 #include <sys/socket.h>
