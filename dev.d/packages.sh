@@ -4,7 +4,7 @@
 MODULE_PACKAGES=(g++ cmake ninja-build libjsoncpp-dev)
 # What the Debian machine's side needs beyond the module.
 APPLIANCE_PACKAGES=(pkg-config libboost1.81-dev libcli11-dev libkrb5-dev libldap-dev libsqlite3-dev libtdb-dev
-    libwbclient-dev)
+    libpam0g-dev libssl-dev libwbclient-dev)
 BUILD_PACKAGES=("${MODULE_PACKAGES[@]}" "${APPLIANCE_PACKAGES[@]}")
 TEST_PACKAGES=("${BUILD_PACKAGES[@]}" libgtest-dev libgmock-dev)
 # The appliance without a domain is tested with Samba's own reader of configuration files beside it.
@@ -14,6 +14,8 @@ CLANG_PACKAGES=("${BUILD_PACKAGES[@]}" clang)
 LINT_PACKAGES=("${CLANG_PACKAGES[@]}" clang-tidy)
 FUZZ_PACKAGES=("${CLANG_PACKAGES[@]}" libclang-rt-14-dev)
 MUTATE_PACKAGES=("${TEST_PACKAGES[@]}" clang-14 python3 python3-clang-14)
+# The page; any other Node from 18 on does as well.
+CONSOLE_PACKAGES=(nodejs npm)
 FORMAT_PACKAGES=(clang-format)
 COVERAGE_PACKAGES=("${TEST_PACKAGES[@]}" gcovr)
 SHELL_PACKAGES=(shellcheck)
@@ -21,7 +23,9 @@ FRESH_PACKAGES=(debootstrap)
 LAB_PACKAGES=(samba winbind samba-dsdb-modules samba-vfs-modules samba-ad-provision smbclient ldb-tools krb5-user
     libsasl2-modules-gssapi-mit bind9-dnsutils libnss-winbind nftables attr acl iproute2 procps busybox cron curl
     python3 python3-samba)
-E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils python3-pytest python3-pytest-xdist)
+E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils openssl python3-pytest python3-pytest-xdist wrk)
+# The browser for the tests of the page; what they are written for is Debian's own.
+BROWSER_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" chromium)
 # realmd and adcli are measured beside the appliance; realmd answers on a message bus.
 APPLIANCE_BENCH_PACKAGES=("${RELEASE_PACKAGES[@]}" "${LAB_PACKAGES[@]}" realmd adcli dbus)
 

@@ -47,6 +47,19 @@ class Commands(VornctlCase):
         self.assertEqual(result.err, "")
         self.assert_body(f"{DOMAIN}/1/get", {})
 
+    def test_status_tells_of_the_last_test(self):
+        self.script[f"{DOMAIN}/1/get"] = ok(MEMBER)
+        for test, text in (
+            ({"time": 1764230400, "success": True, "milliseconds": 120}, "worked, 2025-11-27 08:00:00, 0.12 s"),
+            ({"time": 1764230400, "success": False, "milliseconds": 5000}, "failed, 2025-11-27 08:00:00, 5.00 s"),
+            (None, 'none yet; "vornctl test" makes one'),
+        ):
+            self.script[f"{DIRECTORY}/1/overview"] = ok({"computer_account": "NAS1$", "last_test": test})
+            result = self.run_program("status")
+            self.assertIn(f"Last test        {text}\n", result.out)
+            self.assert_fits(result.out)
+            self.assertEqual(json.loads(self.run_program("status", "--json").out), ok({**MEMBER, "last_test": test}))
+
     def test_status_names_the_advanced_options(self):
         given = {"enable_advance_option": True, "kdc": "10.0.0.9", "register_nics": ["a", "b"]}
         changed = {"domain_type": "NT4", "manage_mode": 1, "advance_domain_conf": given}
@@ -59,9 +72,11 @@ class Commands(VornctlCase):
 
     def test_status_of_no_member(self):
         self.script[f"{DOMAIN}/1/get"] = ok({"enable_domain": False})
+        self.script[f"{DIRECTORY}/1/overview"] = ok({"computer_account": None, "last_test": None})
         result = self.run_program("status")
         self.assertEqual(result.code, 0)
         self.assertIn("The appliance is not a member of a domain.\n", result.out)
+        self.assertEqual(json.loads(self.run_program("status", "--json").out), ok({"enable_domain": False}))
 
     def test_status_as_json(self):
         self.script[f"{DOMAIN}/1/get"] = ok(MEMBER)
@@ -317,6 +332,32 @@ class Commands(VornctlCase):
         shown = ("join lab.test", "failed", "Invalid KDC ip.", "the account NAS1$", "find  [dc1]  0.04 s", "timed out")
         for text in shown:
             self.assertIn(text, result.out)
+
+    def test_link(self):
+        token = "a4KGh0frGnsZObBQTLacUD-b7oDfSKEufxooEVDRLt8"
+        self.script["/session/new-link"] = ok({"token": token, "expires": 1764230400})
+        result = self.run_program("link")
+        self.assertEqual((result.code, result.out), (0, f"Token  {token}\nLink   /#/link/{token}\n"))
+        self.assertEqual(result.err, "It logs in once, until 2025-11-27 08:00:00.\n")
+        self.assert_body("/session/new-link", {})
+        self.assertEqual(self.server.requests[0].verb, "POST")
+        for address in ("https://nas1.example.com:8443", "https://nas1/", "http://127.0.0.1:80", "https://[::1]:8443"):
+            result = self.run_program("link", "--address", address)
+            self.assertIn(f"Link   {address.rstrip('/')}/#/link/{token}\n", result.out)
+        self.assertEqual(json.loads(self.run_program("link", "--json").out)["data"]["token"], token)
+
+    def test_link_to_what_is_no_page(self):
+        addresses = ("nas1", "https://", "ftp://nas1", "https://nas1/page", "https://a b", "https://nas1:x", "https://[]",
+                     "https://nas1:", "https://u@nas1", "https://nas1\x1b", "https://[::1]x:1")
+        for address in addresses:
+            result = self.run_program("link", "--address", address)
+            self.assertEqual((result.code, result.out), (2, ""), address)
+            self.assertIn("--address", result.err)
+        self.assertEqual(self.server.requests, [])
+
+    def test_link_that_is_none(self):
+        self.script["/session/new-link"] = ok({})
+        self.assertEqual(self.run_program("link").code, 3)
 
     def test_steps_when_there_are_none(self):
         for nothing in (None, {}):

@@ -25,6 +25,7 @@ COMMANDS = {
     f"{DIRECTORY}/1/groups": ["groups"],
     f"{DIRECTORY}/1/join_steps": ["steps"],
     "VORN.Appliance.EventLog/1/list": ["events"],
+    "/session/new-link": ["link"],
     "Some.Api/3/method": ["call", "Some.Api", "3", "method"],
 }
 
@@ -256,7 +257,7 @@ class Failures(VornctlCase):
 
     def test_help_fits_the_terminal_and_ends_with_0(self):
         commands = ["status", "join", "leave", "test", "list", "refresh", "options", "schedule", "users", "groups",
-                    "events", "steps", "explain", "call"]
+                    "events", "steps", "link", "explain", "call"]
         general = self.run_program("--help")
         self.assertEqual((general.code, general.err), (0, ""))
         for command in commands:

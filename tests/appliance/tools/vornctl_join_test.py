@@ -303,6 +303,17 @@ class Join(VornctlCase):
             self.assertEqual(terminal.end(), code)
             self.assertEqual(len(self.server.sent(SET)), calls)
 
+    def test_leave_names_the_computer_account_beforehand(self):
+        self.script[f"{DOMAIN}/1/get"] = ok({"enable_domain": True, "domain_name": "LAB"})
+        self.script[f"{DIRECTORY}/1/overview"] = ok({"computer_account": "NAS\x1b1$"})
+        for arguments, fate in (([], "stays"), (["--delete-account", "--user", "adm"], "is deleted")):
+            terminal = self.start_terminal("leave", *arguments)
+            terminal.wait_for("Leave? [y/N] ")
+            self.assertIn(f"computer account NAS\\x1B1$ {fate} on the domain controller",
+                          " ".join(terminal.shown.split()))
+            terminal.type("n\n")
+            self.assertEqual(terminal.end(), 4)
+
     def test_no_file_is_written(self):
         self.script[SET] = ok(None)
         before = set(os.listdir(self.folder))
