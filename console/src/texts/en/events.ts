@@ -1,0 +1,23 @@
+export const events = {
+  'events.title': 'Events',
+  'events.intro': 'What happened to the membership of this appliance, newest first.',
+  'events.loading': 'Loading the events…',
+  'events.failed': 'The events can’t be shown.',
+  'events.empty': 'No events yet',
+  'events.empty.body': 'A join and a return to a workgroup are noted here.',
+  'events.shown': {
+    one: '{first} to {last} of {count} event',
+    other: '{first} to {last} of {count} events',
+  },
+  'events.pages': 'Pages of the events',
+  'events.pages.end': 'Pages of the events, below the list',
+  'events.time': 'Time',
+  'events.level': 'Level',
+  'events.level.information': 'Information',
+  'events.level.other': 'Level {level}',
+  'events.kind': 'Kind',
+  'events.kind.membership': 'Domain membership',
+  'events.kind.other': 'Kind {kind}',
+  'events.text': 'Event',
+  'events.code': 'Code',
+} as const;

@@ -1,0 +1,20 @@
+export const login = {
+  'login.title': 'Log in',
+  'login.to': 'Administration of {host}',
+  'login.user': 'User name',
+  'login.password': 'Password',
+  'login.submit': 'Log in',
+  'login.running': 'Logging in…',
+  'login.who': 'Administrators of the appliance can log in here.',
+  'login.ended': 'Your session ended. Log in to go on where you were.',
+  'login.capsLock': 'Caps Lock is on.',
+  'login.wait': {
+    one: 'You can try again in {count} second.',
+    other: 'You can try again in {count} seconds.',
+  },
+  'login.waitOver': 'You can try again now.',
+  'login.needUser': 'Enter your user name.',
+  'login.needPassword': 'Enter your password.',
+  'login.link.running': 'Logging in with the one-time link…',
+  'login.link.failed': 'The one-time link did not log you in.',
+} as const;
