@@ -76,7 +76,7 @@ bench_module() {
 
 bench_appliance() {
     configure release || die "CMake could not configure the release"
-    build release nothing_module || die "the module that does nothing could not be built"
+    build release nothing_module load || die "the module that does nothing and the load could not be built"
     build_stage
     judge "$APPLIANCE_BENCH" "$@"
 }

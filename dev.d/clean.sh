@@ -23,13 +23,14 @@ main() {
         '') ;;
         *) wrong_usage "\"clean\" takes no \"$1\"." ;;
     esac
-    if [[ ! -d build ]]; then
+    if [[ ! -d build && ! -d console/dist && ! -d console/node_modules ]]; then
         say "ok: there is nothing to remove"
         return
     fi
+    rm -rf --one-file-system -- console/dist console/node_modules
     if $all; then
         rm -rf --one-file-system -- build
-    else
+    elif [[ -d build ]]; then
         find build -mindepth 1 -maxdepth 1 ! -name fuzz-found ! -name fresh -exec rm -rf --one-file-system -- {} +
         rmdir --ignore-fail-on-non-empty build
     fi

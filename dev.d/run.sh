@@ -15,13 +15,14 @@ usage: ./dev run [--once | --unjoined]
 Makes this machine into a storage appliance, without changing it: installs the packages that are missing, builds, brings
 up two domains of Active Directory that trust each other and an appliance beside them, and does the main job there, step
 by step: join, test, list, refresh, options, schedule. Each step is shown with its answer and the time it took. Then all
-of it stays up, with hints what to try, until Ctrl-C takes it down.
+of it stays up, with hints what to try, until Ctrl-C takes it down. The administrator's page is to be seen with a browser
+of this machine; its address and a link that logs in come last.
 
   --once       leave the domain after the last step, take everything down and end
   --unjoined   stop before the join, so that the rest can be done by hand
 
 Domains and appliance live in namespaces of their own: they see a private copy of this machine's files, and nothing that
-they write or send leaves them. Needs root, and the right to make namespaces (in a container: a privileged one).
+they write or send leaves them, but for the page, which listens on 127.0.0.1. Needs root, and the right to make namespaces (in a container: a privileged one).
 TEXT
 }
 
@@ -50,6 +51,7 @@ main() {
     trap interrupted INT TERM HUP
     bring_up
     show_unjoined
+    show_page
     if $unjoined; then
         $once || stay_up hints_to_join
         return
@@ -70,6 +72,7 @@ bring_up() {
     "$LAB" up --only-new --with-pid $$ --trust --appliances nas1 --stage "$STAGE" | sed -u 's/^/  /' ||
         die "the lab could not be brought up"
     "$LAB" vornd nas1 start | sed -u 's/^/  /' || die "the appliance's server did not start"
+    "$LAB" httpd nas1 start | sed -u 's/^/  /' || die "the administrator's page is not served"
 }
 
 # However this command ends, nothing stays up.

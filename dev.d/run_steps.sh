@@ -6,6 +6,8 @@ JOINED_DOMAIN=lab.test
 CONTROLLER=10.77.0.10
 API=VORN.Core.Directory.Domain
 CURL=(curl --silent --show-error --unix-socket /run/vorn/vornd.sock --header 'Content-Type: application/json')
+# The page's certificate is its own.
+PAGE_CURL=(curl --insecure --silent --show-error --fail --max-time 10 --noproxy '*')
 
 title() {
     printf '\n%s\n' "$1"
@@ -14,11 +16,22 @@ title() {
 # show EXPECTED COMMAND...: runs it in the appliance and shows it with its answer, which holds the expected text when it
 # is the right one. The input goes to the command. Ends everything when the step fails.
 show() {
+    local place=("$LAB" exec nas1)
+    show_answer "$@"
+}
+
+# The same on this machine.
+show_here() {
+    local place=()
+    show_answer "$@"
+}
+
+show_answer() {
     local expected=$1 begin result=0 answer
     shift
     printf '  $ %s\n' "$(shown "$@")"
     begin=$EPOCHREALTIME
-    answer=$(timeout --foreground "$STEP_SECONDS" "$LAB" exec nas1 "$@" 2>&1) || result=$?
+    answer=$(timeout --foreground "$STEP_SECONDS" "${place[@]}" "$@" 2>&1) || result=$?
     printf '%s\n' "$answer" | sed 's/^/    /'
     printf '    (%s s)\n' "$(seconds_since "$begin")"
     { printf '\n$ %s\n' "$(shown "$@")" && printf '%s\n(code %d)\n' "$answer" "$result"; } >>"$LOG"
@@ -45,6 +58,19 @@ show_unjoined() {
     title "Status: not a member of any domain yet"
     show 'enable_domain":false' vornctl --json status </dev/null
     show '' vornctl status </dev/null
+}
+
+page_address() {
+    "$LAB" httpd nas1 status | sed -n 's|.* \(https://.*\)/$|\1|p'
+}
+
+show_page() {
+    local address
+    address=$(page_address)
+    [[ -n $address ]] || die "the administrator's page has no address"
+    title "The administrator's page, from this machine"
+    show_here '"status":"ok"' "${PAGE_CURL[@]}" "$address/healthz" </dev/null
+    show_here '</html>' "${PAGE_CURL[@]}" "$address/" </dev/null
 }
 
 show_main_job() {
@@ -87,6 +113,27 @@ show_leave() {
     printf '\n'
 }
 
+# The last words: how to log in to the page. The link comes fresh.
+say_page() {
+    local address link
+    address=$(page_address)
+    link=$("$LAB" exec nas1 vornctl link --address "$address" </dev/null 2>>"$LOG" | sed -n 's/^Link *//p') || true
+    [[ $link == https://*/#/link/?* ]] || die "the appliance gives no link that logs in to its page"
+    cat <<TEXT
+The administrator's page, for a browser of this machine. Its certificate is its own, so the browser asks whether to go on.
+
+  $address/
+  account admin, password $(local_password admin)
+
+  logs in once, within 10 minutes:  $link
+TEXT
+    printf '\n'
+}
+
+local_password() {
+    "$LAB" users | awk -v name="$1" '$1 == "(nas)" && $2 == name { print $3 }'
+}
+
 # Commands in another terminal find the lab by its folder.
 say_folder() {
     [[ -z ${LAB_DIR:-} ]] || printf '\nIn another terminal, first of all:  export LAB_DIR=%q\n' "$LAB_DIR"
@@ -111,6 +158,7 @@ All of it stays up until Ctrl-C. In another terminal, for example:
 TEXT
     "$LAB" users | sed 's/^/  /'
     printf '\n'
+    say_page
     say "ok: the appliance nas1 is a member of LAB; Ctrl-C takes everything down"
 }
 
@@ -128,5 +176,6 @@ All of it stays up until Ctrl-C. In another terminal, for example:
 TEXT
     "$LAB" users | sed 's/^/  /'
     printf '\n'
+    say_page
     say "ok: the appliance nas1 is up and no member yet; Ctrl-C takes everything down"
 }

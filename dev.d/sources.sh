@@ -9,7 +9,8 @@ project_files() {
             [[ ! -f $file ]] || printf '%s\n' "$file"
         done
     else
-        find . \( -path ./build -o -path ./.git -o -path ./ci-output -o -name __pycache__ \) -prune -o -type f -print |
+        find . \( -path ./build -o -path ./.git -o -path ./ci-output -o -name __pycache__ -o -name node_modules \
+            -o -path ./console/dist \) -prune -o -type f -print |
             sed 's|^\./||' | sort
     fi
 }

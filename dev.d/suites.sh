@@ -1,7 +1,7 @@
 # The suites of "./dev test". Each one runs as a process of its own (suite.sh) and leaves its counts with "count".
 # shellcheck shell=bash disable=SC2034,SC2153 # variables shared with the files that read this one
 
-SUITES=(format shell clang lint unit corpus sweep threads coverage library platform lab)
+SUITES=(format shell clang lint unit corpus sweep threads coverage library platform lab browser)
 QUICK_SUITES=(format shell unit corpus library)
 
 about_suite() {
@@ -17,6 +17,7 @@ about_suite() {
         coverage) say "the unit tests reach every line and every branch of src/" ;;
         library) say "the built library: symbols, linking, loading, all operations in a host" ;;
         lab) say "the appliance in real domains: joins, tests, lists, refreshes, faults, kills" ;;
+        browser) say "the page in Chromium: every view and state imitated, the whole life in a real domain, axe-core" ;;
         platform) say "the appliance on Debian without a domain, with address and undefined-behaviour sanitizers" ;;
     esac
 }
@@ -38,6 +39,7 @@ packages_of_suite() {
         lint) printf '%s\n' "${LINT_PACKAGES[@]}" ;;
         platform) printf '%s\n' "${PLATFORM_PACKAGES[@]}" ;;
         lab) printf '%s\n' "${E2E_PACKAGES[@]}" ;;
+        browser) printf '%s\n' "${BROWSER_PACKAGES[@]}" ;;
         unit | corpus | sweep | threads) printf '%s\n' "${TEST_PACKAGES[@]}" ;;
         coverage) printf '%s\n' "${COVERAGE_PACKAGES[@]}" ;;
         library) printf '%s\n' "${RELEASE_PACKAGES[@]}" ;;
@@ -213,6 +215,31 @@ suite_lab() {
         read -r tests failed < <(sum_of_results "$results")
     fi
     count "$tests" "$failed"
+    return "$result"
+}
+
+# The page twice: with an appliance that is imitated in the browser, in any state, and with a real one of a lab.
+suite_browser() {
+    local tests=$ROOT/tests/browser output=$ROOT/build/browser part result=0 begin
+    build_stage
+    need_console_packages
+    if [[ ! -f $tests/node_modules/.package-lock.json || $tests/package-lock.json -nt $tests/node_modules/.package-lock.json ]]; then
+        step --title "\$ npm ci (in ${tests#"$ROOT"/})" npm --prefix "$tests" ci --no-audit --no-fund ||
+            die "the libraries of the tests could not be fetched. Check the network, then try again"
+    fi
+    rm -rf --one-file-system -- "$output"
+    for part in imitated real; do
+        begin=$EPOCHREALTIME
+        say "  \$ node tests/browser/run.mjs $part"
+        node "$tests/run.mjs" "$part" --stage "$STAGE" --page "$STAGE/usr/vorn/share/console" \
+            --httpd "$STAGE/usr/vorn/sbin/vorn-httpd" --output "$output" 2>&1 </dev/null | tee -a "$LOG" |
+            grep --line-buffered -Ev '^ok ' | sed -u 's/^/  /' || result=1
+        printf '  %-62s %8s s\n' "" "$(seconds_since "$begin")"
+        [[ -f $output/$part.xml ]] || result=1
+    done
+    say "  pictures of all views are in ${output#"$ROOT"/}/screenshots, figures in ${output#"$ROOT"/}/figures.json"
+    # shellcheck disable=SC2046 # two numbers
+    count $(cat -- "$output"/*.xml 2>/dev/null | sum_of_results /dev/stdin)
     return "$result"
 }
 

@@ -16,6 +16,7 @@ set_up_appliance() {
         sed -i -E "s/^(passwd|group):.*/\1:         files winbind/" /etc/nsswitch.conf
         printf "127.0.0.1 localhost\n%s %s\n" "$1" "$2" >/etc/hosts' set-up "$(address_of "$host")" "$host" ||
         die "the appliance $host could not be set up"
+    make_local_accounts "$host"
     [[ -z $STAGE ]] || put_stage "$host"
     printf '%s' "$STAGE" >"$STATE/hosts/$host/stage"
     ((${#SHARES[@]} == 0)) || printf '%s\n' "${SHARES[@]}" >"$STATE/hosts/$host/shares"
@@ -55,7 +56,7 @@ vornd() {
             ;;
         log)
             ! [[ -e $STATE/$1.vornd.log ]] || cat -- "$STATE/$1.vornd.log"
-            inside "$1" grep -a ' vorn[a-z]*\[[0-9]*\]: ' /var/log/syslog || true
+            inside "$1" grep -a ' vorn[a-z-]*\[[0-9]*\]: ' /var/log/syslog || true
             ;;
         *) wrong_usage "\"vornd\" knows start, stop, kill, status and log, not \"$2\"." ;;
     esac
@@ -156,7 +157,7 @@ renew() {
     until_true 10 is_gone "$folder/init" || die "$1 does not end"
     # The kernel takes its time with the network of a host that is gone; the plug must be free at once.
     inside "$SWITCH" ip link delete "p-$1" 2>/dev/null || true
-    rm -rf --one-file-system -- "${folder:?}" "$STATE/$1.vornd.log"
+    rm -rf --one-file-system -- "${folder:?}" "$STATE/$1".{vornd,httpd}.log
     make_host "$1" appliance "$address"
     set_up_appliance "$1"
     say "ok: $1 is as new"

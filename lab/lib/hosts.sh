@@ -51,11 +51,13 @@ need_host() {
     pid_in "$STATE/hosts/$1/init" >/dev/null || die "the host $1 is down"
 }
 
-# enter HOST: sets ENTER, the words to put in front of a command of that host. What runs there ends with its caller.
+# enter HOST: sets ENTER, the words to put in front of a command of that host. What runs there ends with its caller. With
+# ENTER_WITHOUT_NETWORK it stays in the network of the machine.
 enter() {
-    local init
+    local init network=--net
     init=$(pid_in "$STATE/hosts/$1/init") || die "the host $1 is down"
-    ENTER=(nsenter --target "$init" --pid --mount --net --uts --ipc --root --wd --
+    [[ -z ${ENTER_WITHOUT_NETWORK:-} ]] || network=""
+    ENTER=(nsenter --target "$init" --pid --mount ${network:+"$network"} --uts --ipc --root --wd --
         setpriv "--bounding-set=$TAKEN" --pdeathsig KILL --)
 }
 

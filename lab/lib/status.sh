@@ -25,6 +25,7 @@ status() {
             ! [[ -s $STATE/hosts/$host/faults ]] || faults=", faults: $(paste -sd , "$STATE/hosts/$host/faults")"
         else
             state="up, vornd $(running_or_stopped vornd_runs "$host")"
+            ! httpd_runs "$host" || state+=", vorn-httpd at $(httpd_url "$host")"
         fi
         printf '%-12s %-12s %s\n' "$host" "$(address_of "$host")" "$state$faults"
     done
@@ -36,5 +37,6 @@ users() {
     awk -F '|' '
         BEGIN { printf "%-8s %-14s %-14s %-13s %s\n", "domain", "name", "password", "state", "what it is for" }
         { for (i = 1; i <= NF; i++) gsub(/^[ \t]+|[ \t]+$/, "", $i) }
-        $1 == "user" { printf "%-8s %-14s %-14s %-13s %s\n", $2, $3, $4, $5, $8 }' "$LAB_HOME/accounts.conf"
+        $1 == "user" { printf "%-8s %-14s %-14s %-13s %s\n", $2, $3, $4, $5, $8 }
+        $1 == "local" { printf "%-8s %-14s %-14s %-13s %s\n", "(nas)", $2, $3, "", $5 }' "$LAB_HOME/accounts.conf"
 }

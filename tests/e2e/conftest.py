@@ -6,6 +6,7 @@ import signal
 import pytest
 
 from appliance import Appliance, Directory
+from door import Door
 from lab import Lab, password
 
 
@@ -64,6 +65,26 @@ def joined(lab):
     answer = machine.client.join("lab.test", "Administrator", password("LAB", "Administrator"))
     assert answer.ok, machine.ctl("steps").text + machine.syslog()
     return machine
+
+
+@pytest.fixture
+def door(appliance):
+    """vorn-httpd of nas1, running; nobody is logged in. The appliance is as before its first start."""
+    entrance = Door(appliance)
+    entrance.start()
+    yield entrance
+    entrance.end()
+
+
+@pytest.fixture(scope="module")
+def shared_door(lab):
+    """One door for all tests of a file, on an appliance that is no member; each leaves it running."""
+    machine = Appliance(lab, "nas1")
+    machine.renew()
+    entrance = Door(machine)
+    entrance.start()
+    yield entrance
+    entrance.end()
 
 
 @pytest.fixture

@@ -89,6 +89,7 @@ def test_every_documented_call_answers_as_documented(joined):
     # Also the first answer, right after the start.
     assert call(DOMAIN, "update_status")["status"] in ("updating", "finish")
     joined.wait_until(lambda: client.refresh_status(task).data["status"] == "finish", 60, "the refresh")
+    call(DIRECTORY, "overview")
     call(DIRECTORY, "refresh_progress")
     call(DIRECTORY, "users")
     call(DIRECTORY, "groups")

@@ -115,7 +115,9 @@ def test_a_killed_controller_refuses_and_can_be_started_again(lab, controller):
     ("fault",), ("fault", "nonsense"), ("fault", "dead", "nas1"), ("fault", "dead", "dc1", "--from"),
     ("fault", "dead", "dc1", "dc2"), ("freeze", "nas1"), ("kill-dc",), ("vornd", "nas1", "jump"), ("vornd", "nas1"),
     ("exec", "nas1"), ("nonsense",), (), ("dns", "nas1"), ("dns", "nas1", "-x"), ("down", "now"),
-    ("vornd", "dc1", "stop"),
+    ("vornd", "dc1", "stop"), ("httpd", "nas1"), ("httpd", "nas1", "jump"), ("httpd", "dc1", "start"),
+    ("httpd", "nas1", "stop", "now"), ("httpd", "nas1", "start", "--listen"), ("httpd", "nas1", "start", "now"),
+    ("httpd", "nas1", "start", "--listen", "localhost:1"),
 ])
 def test_wrong_usage_is_told_in_one_line(lab, words):
     result = lab.command(*words)

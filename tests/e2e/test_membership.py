@@ -1,5 +1,9 @@
 """Join, join again, leave: of both kinds of domain, with controllers that work and that don't."""
 
+import json
+import threading
+import time
+
 import pytest
 
 from client import DIRECTORY
@@ -52,6 +56,66 @@ def test_leaving_and_joining_gives_the_same_configuration(member):
     assert member.client.leave().ok
     assert member.client.join("lab.test", *ADMINISTRATOR).ok
     assert member.read("/usr/vorn/etc/smb.conf") == joined
+
+
+def test_the_last_test_is_told_until_the_membership_changes(member, lab):
+    def last_test():
+        return member.client.call(DIRECTORY, 1, "overview").data["last_test"]
+
+    assert last_test() is None
+    assert "Last test        none yet" in member.ctl("status").out
+    before = int(time.time())
+    assert member.client.test_dc() is True
+    good = last_test()
+    assert good["success"] is True and good["time"] >= before and 0 < good["milliseconds"] < 12000
+    assert "Last test        worked, " in member.ctl("status").out
+    with lab.fault("dead", "dc1", only=member.host):
+        assert member.ctl("test").code == 5
+    bad = last_test()
+    assert bad["success"] is False and bad["time"] >= good["time"] and bad["milliseconds"] > good["milliseconds"]
+    assert "Last test        failed, " in member.ctl("status").out
+    assert json.loads(member.ctl("--json", "status").out)["data"]["last_test"] == bad
+    # It outlives the server, but neither a new join nor a leave.
+    member.kill()
+    member.start()
+    assert last_test() == bad
+    assert member.client.join("lab.test", *ADMINISTRATOR).ok
+    assert last_test() is None
+    assert member.client.test_dc() is True
+    assert last_test()["success"] is True
+    # A join that fails changes nothing.
+    assert member.client.join("lab.test", "Administrator", "wrong").code == 2607
+    assert last_test()["success"] is True
+    assert member.client.leave().ok
+    assert last_test() is None and not member.exists("/var/lib/vorn/last_test.json")
+    assert member.client.test_dc() is False
+    assert last_test() is None
+
+
+def test_a_leave_names_the_computer_account_beforehand(member):
+    overview = member.client.call(DIRECTORY, 1, "overview").data
+    assert (overview["host_name"], overview["computer_account"]) == ("NAS1", "NAS1$")
+    assert {"name": "eth0", "addresses": ["10.77.0.101"]} in overview["interfaces"]
+    # On a terminal, where it asks.
+    asked = member.exec("script", "-qec", "/usr/vorn/bin/vornctl leave", "/dev/null", input="n\n")
+    assert "The appliance's computer account NAS1$ stays on the domain controller." in asked.out, asked
+    assert member.client.get()["enable_domain"] is True
+    assert member.client.leave().ok
+    assert member.client.call(DIRECTORY, 1, "overview").data["computer_account"] is None
+
+
+def test_a_join_that_runs_is_told(appliance):
+    busy = set()
+    answers = []
+    join = threading.Thread(target=lambda: answers.append(appliance.client.join("lab.test", *ADMINISTRATOR)))
+    join.start()
+    while join.is_alive():
+        busy.add(appliance.client.call(DIRECTORY, 1, "overview").data["busy"])
+        time.sleep(0.05)
+    assert answers[0].ok, appliance.ctl("steps").text
+    assert "join" in busy and "leave" not in busy
+    assert appliance.client.call(DIRECTORY, 1, "overview").data["busy"] is None
+    assert appliance.client.get()["enable_domain"] is True
 
 
 @pytest.mark.parametrize("fault", ["dead", "ldap-drop", "smb-drop"])

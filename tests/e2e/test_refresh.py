@@ -1,8 +1,15 @@
 """The local lists of users and groups: complete or as they were, whatever happens to the controllers."""
 
+import threading
 import time
 
 from client import DIRECTORY
+
+
+def progress(machine):
+    overview = machine.client.call(DIRECTORY, 1, "overview").data["refresh"]
+    assert overview is None or {"running", "finished"} < set(overview)
+    return overview
 
 
 def names(machine, kind, domain):
@@ -53,6 +60,38 @@ def test_a_dead_controller_never_empties_a_list(member, lab):
         assert names(member, "users", "LAB") == before
 
 
+def test_the_overview_follows_a_refresh_and_keeps_its_result(member, lab):
+    assert progress(member) is None
+    task = member.client.start_refresh().data["task_id"]
+    seen = [progress(member)]
+    while member.client.refresh_status(task).data["status"] != "finish":
+        seen.append(progress(member))
+        time.sleep(0.02)
+    # It runs from the request on without a gap, and its counts are those of users and of groups.
+    states = [state["running"] for state in seen]
+    assert states[0] is True and states == sorted(states, reverse=True), states
+    done = progress(member)
+    assert done["running"] is False and done["finished"] >= done["started"] and done["errors"] == []
+    assert (done["kind"], done["domains_done"], done["domains"]) == ("group", 2, 2)
+    member.kill()
+    member.start()
+    assert progress(member) == done
+    # One of the appliance's own.
+    with lab.fault("slow", "dc1"):
+        fetch = threading.Thread(target=member.exec, args=("/usr/vorn/sbin/vornwin", "-updateDomain"))
+        fetch.start()
+        member.wait_until(lambda: progress(member)["running"], 10, "the fetch")
+        fetch.join()
+    own = progress(member)
+    assert own["running"] is False and own["finished"] >= done["finished"] and own["started"] >= done["finished"], own
+    # One that finds no controller is the last one, and has failed.
+    with lab.fault("dead", "dc1", only=member.host):
+        assert member.client.refresh(deadline=180).code == 2623
+    failed = progress(member)
+    assert failed["running"] is False and failed["errors"], failed
+    assert {error["domain"] for error in failed["errors"]} <= {"LAB", "OTHER"}
+
+
 def test_twice_at_once(member, lab):
     with lab.fault("slow", "dc1"):
         first = member.client.start_refresh().data["task_id"]
@@ -68,7 +107,11 @@ def test_stopped(member, lab):
     with lab.fault("dead", "dc1", only=member.host):
         task = member.client.start_refresh().data["task_id"]
         time.sleep(1)
+        assert progress(member)["running"] is True and progress(member)["finished"] is None
         assert member.client.call("VORN.Core.Directory.Domain", 1, "update_stop").ok
+        member.wait_until(lambda: not progress(member)["running"], 5, "the end of the refresh")
+        stopped = progress(member)
+        assert stopped["finished"] and stopped["errors"][-1]["reason"] == "ended before it was done", stopped
         assert member.client.refresh_status(task).code == 121
         assert member.exec("pgrep", "-f", "vornd --task").code != 0
     # The next one is not kept from starting.
