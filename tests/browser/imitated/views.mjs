@@ -1,0 +1,38 @@
+// The views of the page and small words for looking at them.
+
+import assert from "node:assert/strict";
+
+import {errorOf} from "../lib/catalogue.mjs";
+
+// In the order of the navigation.
+export const VIEWS = [
+    {name: "Overview", path: "/overview"},
+    {name: "Domains", path: "/domains"},
+    {name: "Users", path: "/users"},
+    {name: "Groups", path: "/groups"},
+    {name: "Options", path: "/options"},
+    {name: "Schedule", path: "/schedule"},
+    {name: "Events", path: "/events"},
+];
+
+// Some place shows this text now or soon.
+export const expectText = (place, text, ms) =>
+    place.getByText(text).filter({visible: true}).first().waitFor({state: "visible", timeout: ms});
+
+export const expectGone = (locator, ms) => locator.first().waitFor({state: "hidden", timeout: ms});
+
+// The element holds the keyboard's focus.
+export async function expectFocus(locator) {
+    assert.ok(await locator.evaluate((element) => element === document.activeElement),
+        `${locator} does not have the focus`);
+}
+
+// The alert of an error: what it means, its cause, what to try, its code, word for word as the catalogue has it.
+export async function expectError(page, code, ms) {
+    const {meaning, cause, action} = errorOf(code);
+    const alert = page.getByRole("alert").filter({hasText: `Code ${code}`});
+    await alert.first().waitFor({timeout: ms});
+    for (const text of [meaning, cause, action]) {
+        await expectText(alert, text);
+    }
+}
