@@ -35,16 +35,20 @@ console_is_new() {
             -newer "$CONSOLE_STAMP" -print -quit) ]]
 }
 
-build_console() {
+fetch_console_libraries() {
     local modules=$CONSOLE/node_modules/.package-lock.json
-    ! console_is_new || return 0
     need_console_packages
-    rm -f -- "$CONSOLE_STAMP"
-    { mkdir -p -- "${CONSOLE_STAMP%/*}" && : >"$CONSOLE_STAMP.new"; } || die "${CONSOLE_STAMP%/*} can't be written"
     if [[ ! -f $modules || $CONSOLE/package-lock.json -nt $modules ]]; then
         step --title "\$ npm ci (in ${CONSOLE#"$ROOT"/})" npm --prefix "$CONSOLE" ci --no-audit --no-fund ||
             die "the libraries of the page could not be installed. The reason is above"
     fi
+}
+
+build_console() {
+    ! console_is_new || return 0
+    fetch_console_libraries
+    rm -f -- "$CONSOLE_STAMP"
+    { mkdir -p -- "${CONSOLE_STAMP%/*}" && : >"$CONSOLE_STAMP.new"; } || die "${CONSOLE_STAMP%/*} can't be written"
     step --title "\$ npm run build (in ${CONSOLE#"$ROOT"/})" npm --prefix "$CONSOLE" run build ||
         die "the page could not be built"
     [[ -f $CONSOLE/dist/index.html ]] || die "the build of the page has left no page"

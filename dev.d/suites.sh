@@ -1,7 +1,7 @@
 # The suites of "./dev test". Each one runs as a process of its own (suite.sh) and leaves its counts with "count".
 # shellcheck shell=bash disable=SC2034,SC2153 # variables shared with the files that read this one
 
-SUITES=(format shell clang lint unit corpus sweep threads coverage library platform lab browser)
+SUITES=(format shell clang lint unit corpus sweep threads coverage library platform console lab browser)
 QUICK_SUITES=(format shell unit corpus library)
 
 about_suite() {
@@ -17,6 +17,7 @@ about_suite() {
         coverage) say "the unit tests reach every line and every branch of src/" ;;
         library) say "the built library: symbols, linking, loading, all operations in a host" ;;
         lab) say "the appliance in real domains: joins, tests, lists, refreshes, faults, kills" ;;
+        console) say "the page's own tests, its types, eslint and prettier" ;;
         browser) say "the page in Chromium: every view and state imitated, the whole life in a real domain, axe-core" ;;
         platform) say "the appliance on Debian without a domain, with address and undefined-behaviour sanitizers" ;;
     esac
@@ -216,6 +217,26 @@ suite_lab() {
     fi
     count "$tests" "$failed"
     return "$result"
+}
+
+# Types and style count as a test each.
+suite_console() {
+    local check failed=0 tests=0 wrong=0 results=$LOGS/console.xml
+    fetch_console_libraries
+    for check in typecheck lint; do
+        step --title "\$ npm run $check (in console)" npm --prefix "$CONSOLE" run "$check" || failed=$((failed + 1))
+    done
+    rm -f -- "$results"
+    step --title "\$ npm test (in console)" npm --prefix "$CONSOLE" test -- --reporter=default --reporter=junit \
+        --outputFile.junit="$results" || wrong=1
+    [[ ! -f $results ]] || read -r tests wrong < <(sum_of_vitest "$results")
+    count "$((tests + 2))" "$((wrong + failed))"
+    ((tests > 0 && wrong + failed == 0))
+}
+
+# sum_of_vitest FILE: how many tests ran, and how many of them failed or were skipped.
+sum_of_vitest() {
+    awk '/<testcase / { tests++ } /<(failure|error|skipped)[ >\/]/ { failed++ } END { print tests + 0, failed + 0 }' "$1"
 }
 
 # The page twice: with an appliance that is imitated in the browser, in any state, and with a real one of a lab.
