@@ -25,6 +25,8 @@ export default defineConfig({
     target: 'es2022',
     outDir: 'dist',
     assetsInlineLimit: 0,
+    // One for all: the loader of a view's file does not ask again for styles that it could not get.
+    cssCodeSplit: false,
     modulePreload: { polyfill: false },
     reportCompressedSize: false,
   },

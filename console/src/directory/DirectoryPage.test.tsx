@@ -67,7 +67,9 @@ describe('the list', () => {
   it('shows a page, the total and its age', async () => {
     show();
     expect(await screen.findByText('1 to 3 of 100,000 users')).toBeInTheDocument();
-    expect(within(screen.getByRole('grid', { name: 'Users of LAB' })).getByText('user0')).toBeInTheDocument();
+    expect(
+      within(screen.getByRole('table', { name: 'Users of LAB' })).getByText('user0'),
+    ).toBeInTheDocument();
     const age = screen.getByText('5 minutes ago', { selector: 'time' });
     expect(age).toHaveAttribute('title', expect.stringMatching(/202\d/));
   });

@@ -30,7 +30,7 @@ it('shows time, level, kind, text and code of each event in words', async () => 
     'events.list': () => ({ total: 2, events: [event(0), event(1, { level: 3, kind: 7, code: -1 })] }),
   });
   render(<EventsPage />);
-  const [first, second] = within(await screen.findByRole('grid'))
+  const [first, second] = within(await screen.findByRole('table'))
     .getAllByRole('row')
     .slice(1);
   expect(first).toHaveTextContent(

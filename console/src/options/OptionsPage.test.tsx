@@ -152,6 +152,21 @@ describe('leaving', () => {
     await waitFor(() => expect(window.location.hash).toBe('#/events'));
   });
 
+  it('asks at the first press of Back, also after a link was not followed', async () => {
+    window.location.hash = '#/domains';
+    await waitFor(() => expect(window.history.state).not.toBeNull());
+    window.location.hash = '#/options';
+    await waitFor(() => expect(window.history.state).not.toBeNull());
+    show();
+    await userEvent.click(await time());
+    go('#/events');
+    await userEvent.click(await screen.findByRole('button', { name: 'Stay here' }));
+    await waitFor(() => expect(window.location.hash).toBe('#/options'));
+    window.history.back();
+    await userEvent.click(await screen.findByRole('button', { name: /Leave and discard/ }));
+    await waitFor(() => expect(window.location.hash).toBe('#/domains'));
+  });
+
   it('does not ask when nothing is changed', async () => {
     window.location.hash = '#/options';
     show();

@@ -31,7 +31,12 @@ export function Header({ host, open, onToggle }: HeaderProps) {
           />
         </MastheadToggle>
         <MastheadBrand>
-          <a className="vorn-brand" href={hrefOf(kHome)}>
+          {/* Narrow screens show no word of it before the host's name is known. */}
+          <a
+            className="vorn-brand"
+            href={hrefOf(kHome)}
+            {...(host === null && { 'aria-label': t('app.name') })}
+          >
             <img src={icon} alt="" width="28" height="28" />
             {host !== null && <span className="vorn-brand__host">{host}</span>}
             <span className="vorn-brand__app">{t('app.name')}</span>

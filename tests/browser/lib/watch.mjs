@@ -4,6 +4,8 @@
 // Chromium's own line about an answer of 400 and above, or about none. It is no fault of the page when the server is
 // made to refuse or to vanish; what the page makes of it is what the tests look at.
 const REFUSED = /^Failed to load resource: /;
+// One of the page's own files may fail in this way only: nobody was there to answer.
+const NOBODY_THERE = /^Failed to load resource: net::ERR_CONNECTION_REFUSED$/;
 
 export class Watch {
     constructor(base) {
@@ -47,7 +49,9 @@ export class Watch {
 
     isRefusal(message) {
         const url = message.location().url;
-        return REFUSED.test(message.text()) && /^\/(session|webapi)(\/|$)/.test(url ? new URL(url).pathname : "");
+        const path = url ? new URL(url).pathname : "";
+        return (REFUSED.test(message.text()) && /^\/(session|webapi)(\/|$)/.test(path)) ||
+            (NOBODY_THERE.test(message.text()) && /^\/assets\//.test(path));
     }
 
     fault(text) {
