@@ -256,5 +256,5 @@ imitated("a session that ends while a form is filled in keeps nobody from loggin
         await dialog.getByRole("button", {name: "Join", exact: true}).click();
         await expectText(page, "Your session ended. Log in to go on where you were.");
         await logIn(page);
-        await page.getByRole("heading", {level: 1, name: "Overview"}).waitFor();
+        await page.getByRole("dialog", {name: "Join a domain"}).waitFor();
     });
