@@ -227,8 +227,10 @@ def test_a_call_that_runs_is_never_pushed_out(door, visitor):
     body = b'{"user":"nobody-there","password":"wrong"}'
     lines = ["POST /session/login HTTP/1.1", *fields(door), "Content-Type: application/json",
              f"Content-Length: {len(body)}", f"Cookie: {COOKIE}=x"]
-    with door.connect() as connection:
+    with crowd(door, 250, b"GET / HTTP/1.1\r\n") as unfinished, door.connect() as connection:
+        time.sleep(1.1)  # so long a newcomer is left alone
         connection.sendall("\r\n".join(lines).encode() + b"\r\n\r\n" + body)
-        with crowd(door, 280, b"GET / HTTP/1.1\r\n"):
+        with crowd(door, 25, b"GET / HTTP/1.1\r\n"):
             connection.settimeout(10)
             assert connection.recv(65536).startswith(b"HTTP/1.1 401 ")
+            assert not all(map(is_open, unfinished))
