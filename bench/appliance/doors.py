@@ -88,7 +88,6 @@ def proportional_memory(machine, door):
 
 def measure(machine, findings, options, say):
     machine.fresh()
-    machine.start()
     machine.join()
     door = Door(machine)
     memory = []
