@@ -15,7 +15,9 @@ export function sessionStarted(info: SessionInfo): void {
 }
 
 export function sessionEnded(): void {
-  session.set({ state: 'none', ended: session.get().state === 'active' });
+  const now = session.get();
+  // Of several calls that were on their way each tells it.
+  session.set({ state: 'none', ended: now.state === 'active' || (now.state === 'none' && now.ended) });
 }
 
 export function sessionClosed(): void {
