@@ -47,8 +47,9 @@ imitated("a view that is open when the server goes keeps what it shows, and goes
     });
 
 imitated("a view that is opened for the first time while the server is gone comes when it is back",
-    async ({page, go, imitation, context}) => {
+    async ({page, go, imitation, context, watch}) => {
         let gone = false;
+        watch.expectServerGone();
         await context.route("**/assets/**", (route) => (gone ? route.abort("connectionrefused") : route.fallback()));
         await go("/overview");
         await expectText(page, "Member of LAB");

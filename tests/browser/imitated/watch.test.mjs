@@ -11,15 +11,19 @@ const POLICY = "default-src 'none'; script-src 'self'; style-src 'self'; connect
 
 after(closeBrowser);
 
-async function faultsOf(script, html = "") {
+async function faultsOf(script, html = "", prepare = () => {}) {
     const context = await (await theBrowser()).newContext();
     const watch = new Watch(BASE);
+    prepare(watch);
     try {
         await watch.attach(context);
         await context.route("**/*", (route) => {
             const {pathname, port} = new URL(route.request().url());
             if (pathname.startsWith("/session") || port === "10") {
                 return route.fulfill({status: 401, body: "{}", headers: {"access-control-allow-origin": "*"}});
+            }
+            if (pathname.startsWith("/assets/")) {
+                return route.abort(pathname.slice("/assets/".length));
             }
             return pathname === "/script.js" ? route.fulfill({contentType: "text/javascript", body: script})
                 : route.fulfill({
@@ -44,6 +48,22 @@ test("a quiet page has no faults", async () => {
 
 test("the browser's own line about an answer of 401 to the API is no fault", async () => {
     assert.equal(await faultsOf("fetch('/session');"), "");
+});
+
+const LOST_FILES = ["connectionrefused", "connectionreset", "connectionclosed"];
+const asking = (reason) => `const tag = document.createElement("script"); tag.src = "/assets/${reason}";
+    document.head.append(tag);`;
+
+for (const reason of LOST_FILES) {
+    test(`a file that nobody sends (${reason}) is a fault, unless the server may be gone`, async () => {
+        assert.match(await faultsOf(asking(reason)), /console: Failed to load resource.*assets/);
+        assert.equal(await faultsOf(asking(reason), "", (watch) => watch.expectServerGone()), "");
+    });
+}
+
+test("a file that fails for another reason is a fault also when the server may be gone", async () => {
+    assert.match(await faultsOf(asking("accessdenied"), "", (watch) => watch.expectServerGone()),
+        /console: Failed to load resource.*assets/);
 });
 
 for (const [what, script, html, pattern] of [

@@ -4,8 +4,10 @@
 // Chromium's own line about an answer of 400 and above, or about none. It is no fault of the page when the server is
 // made to refuse or to vanish; what the page makes of it is what the tests look at.
 const REFUSED = /^Failed to load resource: /;
-// One of the page's own files may fail in this way only: nobody was there to answer.
-const NOBODY_THERE = /^Failed to load resource: net::ERR_CONNECTION_REFUSED$/;
+// What Chromium says of a file when nobody is there to answer, or is no more: what becomes of a connection depends on
+// the moment at which the server goes.
+const NOBODY_THERE =
+    /^Failed to load resource: net::ERR_(CONNECTION_(REFUSED|RESET|CLOSED)|SOCKET_NOT_CONNECTED|EMPTY_RESPONSE)$/;
 
 export class Watch {
     constructor(base) {
@@ -14,6 +16,12 @@ export class Watch {
         this.faults = [];
         this.requests = [];
         this.refused = new Set();
+        this.serverMayGo = false;
+    }
+
+    // For tests that take the server away: only then may one of the page's own files be missed.
+    expectServerGone() {
+        this.serverMayGo = true;
     }
 
     async attach(context) {
@@ -51,7 +59,7 @@ export class Watch {
         const url = message.location().url;
         const path = url ? new URL(url).pathname : "";
         return (REFUSED.test(message.text()) && /^\/(session|webapi)(\/|$)/.test(path)) ||
-            (NOBODY_THERE.test(message.text()) && /^\/assets\//.test(path));
+            (this.serverMayGo && NOBODY_THERE.test(message.text()) && /^\/assets\//.test(path));
     }
 
     fault(text) {

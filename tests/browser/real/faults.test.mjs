@@ -24,8 +24,9 @@ real("vornd killed and started: the page says so, recovers, and the session goes
     });
 
 real("vorn-httpd stopped and started: the page says so, recovers, and the session goes on",
-    {seconds: 90, before: renew}, async ({page, logIn}) => {
+    {seconds: 90, before: renew}, async ({page, logIn, watch}) => {
         await logIn();
+        watch.expectServerGone();
         await lab.must(["httpd", HOST, "stop"]);
         await page.getByRole("link", {name: "Events", exact: true}).click();
         // A view that was never open is a file of its own, which can't be had now either.
