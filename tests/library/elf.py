@@ -1,5 +1,6 @@
 """What readelf tells of a shared object."""
 
+import os
 import re
 import subprocess
 from collections import namedtuple
@@ -21,7 +22,7 @@ def dynamic_symbols(path):
             continue
         kind, binding, section, text = fields[3], fields[4], fields[6], fields[7]
         name, _, version = text.partition("@")
-        if section != "ABS":
+        if section != "ABS" and kind != "SECTION":
             symbols.append(Symbol(name, version.lstrip("@"), kind, binding, section != "UND"))
     return symbols
 
@@ -43,6 +44,11 @@ def segments(path):
 
 
 def library_paths(path):
-    """Where the loader of this machine finds each library that the object needs."""
+    """Where each library that the object needs lies: for a module of another machine in the named folders, else where
+    the loader of this one finds it."""
+    folders = [folder for folder in os.environ.get("VORN_LIBRARY_FOLDERS", "").split(":") if folder]
+    if folders:
+        found = ((name, os.path.join(folder, name)) for name in needed(path) for folder in folders)
+        return {name: place for name, place in found if os.path.exists(place)}
     output = subprocess.run(["/usr/bin/ldd", path], check=True, capture_output=True, text=True).stdout
     return dict(re.findall(r"^\s+(\S+) => (/\S+) ", output, re.MULTILINE))

@@ -60,7 +60,7 @@ int MappingsOf(const std::string& name) {
     return count;
 }
 
-long ResidentPages() {
+[[maybe_unused]] long ResidentPages() {
     std::ifstream statm("/proc/self/statm");
     long total = 0;
     long resident = 0;
@@ -206,14 +206,17 @@ TEST(ReloadedModule, DoesNotGrowInAHundredRounds) {
     }
     const int mappings = MappingsOf("");
     const std::size_t allocated = mallinfo2().uordblks;
-    const long resident = ResidentPages();
+    [[maybe_unused]] const long resident = ResidentPages();
     for (int i = 0; i < kRounds; ++i) {
         LoadUseAndUnload();
     }
     EXPECT_EQ(MappingsOf(""), mappings);
     // Less than one allocation for each round: what the allocator keeps for itself varies a little.
     EXPECT_LT(mallinfo2().uordblks, allocated + kRounds * kSmallestChunk);
+#ifndef VORN_EMULATED
+    // An emulator's own memory would be counted too, and it keeps what it has translated.
     EXPECT_LE(ResidentPages(), resident + 32);
+#endif
 }
 
 TEST(ReloadedModule, HasOneTableHoweverOftenItIsLoaded) {
