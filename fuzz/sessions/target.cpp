@@ -4,7 +4,7 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include "fuzz/server_targets.h"
+#include "fuzz/sessions/targets.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     static const fuzz::ServerTarget& target = fuzz::FindServerTarget(FUZZ_TARGET);

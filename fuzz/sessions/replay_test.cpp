@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "fuzz/server_targets.h"
+#include "fuzz/sessions/targets.h"
 
 namespace {
 

@@ -1,4 +1,4 @@
-#include "fuzz/server_targets.h"
+#include "fuzz/sessions/targets.h"
 
 #include <arpa/inet.h>
 
