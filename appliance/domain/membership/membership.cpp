@@ -3,8 +3,10 @@
 #include <unistd.h>
 
 #include <array>
+#include <cerrno>
 
 #include "appliance/base/conf_file.h"
+#include "appliance/base/file.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/text.h"
 #include "appliance/domain/membership/secrets.h"
@@ -69,6 +71,11 @@ bool TrustedDomainsEnabled() {
 }
 
 std::optional<FileLock> LockSmbConf(std::chrono::milliseconds wait) {
+    // Whoever comes first after a start of the machine makes the folder: cron's programs may come before the server.
+    if (const std::error_code error = MakeFolder(Path(kRun), 0755)) {
+        errno = error.value();
+        return std::nullopt;
+    }
     return FileLock::Take(Path(kSmbConfLock), wait);
 }
 
