@@ -3,6 +3,8 @@
 #include <strings.h>
 
 #include <cctype>
+#include <cstdint>
+#include <functional>
 
 #include "bench/cheap_platform.h"
 
@@ -86,12 +88,12 @@ void MakeTasks(State& state) {
 }  // namespace
 
 std::size_t KeyHash::operator()(std::string_view key) const {
-    std::size_t hash = 14695981039346656037U;
+    std::uint64_t hash = 14695981039346656037U;
     for (const char letter : key) {
         // Folds the case of letters; that it also folds some other characters is the comparison's to tell apart.
         hash = (hash ^ (static_cast<unsigned char>(letter) | 0x20U)) * 1099511628211U;
     }
-    return hash;
+    return std::hash<std::uint64_t>()(hash);
 }
 
 bool KeyEqual::operator()(std::string_view left, std::string_view right) const {

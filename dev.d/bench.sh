@@ -1,25 +1,28 @@
 # ./dev bench: times and sizes of the release, alone and as an appliance in real domains.
 # shellcheck shell=bash
 
-for file in packages cmake stage; do
+for file in packages cmake stage target; do
     # shellcheck source=/dev/null
     . "$ROOT/dev.d/$file.sh"
 done
 
 MODULE_BENCH=bench/run
 APPLIANCE_BENCH=bench/appliance/run
+TARGET_BENCH=bench/target
 
 usage() {
     cat <<'TEXT'
 usage: ./dev bench
        ./dev bench module [ARGUMENT...]
        ./dev bench appliance [ARGUMENT...]
+       ./dev bench target
 
-Builds the release, measures it and holds the figures against the wanted ones. Without a name both are measured.
+Builds the release, measures it and holds the figures against the wanted ones. Without a name the first two are measured.
 
   module     the module alone, on a platform that costs nothing: times, allocations, instructions
   appliance  the appliance in real domains, which are brought up for it: joins, status, refreshes of 20,000 users,
              memory, a dead controller; beside Samba's own tools. Needs root, and the right to make namespaces
+  target     the module on a 32-bit big-endian machine beside this one, under qemu: instructions, heap, size
 
 Arguments of "module":
 
@@ -33,11 +36,11 @@ main() {
     case ${1:-} in
         -h | --help) usage ;;
         '') measure_both ;;
-        module | appliance)
+        module | appliance | target)
             [[ ${2:-} != @(-h|--help) ]] || { usage && return; }
             "measure_$1" "${@:2}"
             ;;
-        *) wrong_usage "\"bench\" measures \"module\" or \"appliance\", not \"$1\"." ;;
+        *) wrong_usage "\"bench\" measures \"module\", \"appliance\" or \"target\", not \"$1\"." ;;
     esac
 }
 
@@ -54,6 +57,19 @@ measure_appliance() {
     need_packages "${APPLIANCE_BENCH_PACKAGES[@]}"
     bench_appliance "$@" || die "a wanted figure of the appliance is missed by far; see the table"
     say "ok: measured; no wanted figure of the appliance is missed by far"
+}
+
+measure_target() {
+    (($# == 0)) || wrong_usage "\"bench target\" takes no \"$1\"."
+    start_log
+    need_packages "${RELEASE_PACKAGES[@]}" "${TARGET_PACKAGES[@]}"
+    build_target_prefix
+    local preset
+    for preset in release powerpc; do
+        { configure "$preset" && build "$preset"; } || die "the preset $preset could not be built"
+    done
+    judge "$TARGET_BENCH" || die "the target's library is larger than wanted; see above"
+    say "ok: measured"
 }
 
 measure_both() {

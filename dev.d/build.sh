@@ -1,7 +1,7 @@
 # ./dev build: configures and builds a preset.
 # shellcheck shell=bash
 
-for file in packages cmake; do
+for file in packages cmake target; do
     # shellcheck source=/dev/null
     . "$ROOT/dev.d/$file.sh"
 done
@@ -18,6 +18,12 @@ Builds everything, or the targets, of a preset into build/PRESET. The presets ar
   coverage     with counters of lines and branches
   fuzz         the fuzzers, by clang
   release      what is shipped: build/release/src/vorn_directory_domain.so
+
+and for a 32-bit big-endian target
+
+  powerpc           what is shipped: build/powerpc/src/vorn_directory_domain.so
+  powerpc-debug     debug build
+  powerpc-sanitize  with address and undefined-behaviour sanitizers
 TEXT
 }
 
@@ -39,6 +45,7 @@ main() {
     start_log
     mapfile -t packages < <(packages_of_preset "$preset")
     need_packages "${packages[@]}"
+    [[ $preset != powerpc* ]] || build_target_prefix
     configure "$preset" || die "CMake could not configure the preset $preset"
     build "$preset" "$@" || die "the preset $preset could not be built; the first error is above"
     say "ok: built in build/$preset"

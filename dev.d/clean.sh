@@ -23,11 +23,15 @@ main() {
         '') ;;
         *) wrong_usage "\"clean\" takes no \"$1\"." ;;
     esac
-    if [[ ! -d build && ! -d console/dist && ! -d console/node_modules ]]; then
+    local outside=(console/dist console/node_modules tests/browser/node_modules ci-output) path found=false
+    for path in build "${outside[@]}"; do
+        [[ ! -d $path ]] || found=true
+    done
+    if ! $found; then
         say "ok: there is nothing to remove"
         return
     fi
-    rm -rf --one-file-system -- console/dist console/node_modules
+    rm -rf --one-file-system -- "${outside[@]}"
     if $all; then
         rm -rf --one-file-system -- build
     elif [[ -d build ]]; then

@@ -1,7 +1,7 @@
 # Configuring, building and testing a preset.
 # shellcheck shell=bash
 
-PRESETS=(dev asan-ubsan tsan coverage fuzz release)
+PRESETS=(dev asan-ubsan tsan coverage fuzz release powerpc powerpc-debug powerpc-sanitize)
 
 is_preset() {
     local preset

@@ -32,6 +32,18 @@ apt_source() {
         dpkg-source -x "$folder"/download/*.dsc "$folder/source" >>"$LOG" 2>&1
 }
 
+# make_target_json SOURCE BUILD: into a new prefix, when its tests pass.
+make_target_json() {
+    step --title "\$ cmake $JSON_SOURCE (for the target)" cmake -G Ninja -S "$1" -B "$2" --toolchain "$TOOLCHAIN" \
+        -D CMAKE_BUILD_TYPE=MinSizeRel -D CMAKE_INSTALL_PREFIX="$TARGET_PREFIX" -D BUILD_SHARED_LIBS=ON \
+        -D BUILD_STATIC_LIBS=OFF -D BUILD_OBJECT_LIBS=OFF -D JSONCPP_WITH_POST_BUILD_UNITTEST=OFF \
+        -D CMAKE_INSTALL_INCLUDEDIR=include/jsoncpp &&
+        step --title "\$ cmake --build (the same)" cmake --build "$2" --parallel "$(cores)" &&
+        step --title "\$ ctest (the same)" ctest --test-dir "$2" --output-on-failure --tests-regex '^jsoncpp_test$' \
+            --no-tests=error &&
+        cmake --install "$2" --prefix "$TARGET_PREFIX.new" >>"$LOG" 2>&1
+}
+
 # The target's JSON library, built once and tested, in a prefix of its own. Whole or not there. Its other tests start its
 # programs from scripts, which would need a kernel that runs programs of the target by itself.
 build_target_prefix() {
@@ -39,14 +51,7 @@ build_target_prefix() {
     [[ ! -e $TARGET_PREFIX/lib/libjsoncpp.so ]] || return 0
     apt_source "$JSON_SOURCE" "$work" || die "the source of $JSON_SOURCE could not be fetched"
     rm -rf -- "$build" "$TARGET_PREFIX.new"
-    step --title "\$ cmake $JSON_SOURCE (for the target)" cmake -G Ninja -S "$work/source" -B "$build" \
-        --toolchain "$TOOLCHAIN" -D CMAKE_BUILD_TYPE=MinSizeRel -D CMAKE_INSTALL_PREFIX="$TARGET_PREFIX" \
-        -D BUILD_SHARED_LIBS=ON -D BUILD_STATIC_LIBS=OFF -D BUILD_OBJECT_LIBS=OFF \
-        -D JSONCPP_WITH_POST_BUILD_UNITTEST=OFF -D CMAKE_INSTALL_INCLUDEDIR=include/jsoncpp &&
-        step --title "\$ cmake --build (the same)" cmake --build "$build" --parallel "$(cores)" &&
-        step --title "\$ ctest (the same)" ctest --test-dir "$build" --output-on-failure --tests-regex '^jsoncpp_test$' --no-tests=error &&
-        cmake --install "$build" --prefix "$TARGET_PREFIX.new" >>"$LOG" 2>&1 ||
-        die "$JSON_SOURCE could not be built for the target"
+    make_target_json "$work/source" "$build" || die "$JSON_SOURCE could not be built for the target"
     rm -rf -- "$TARGET_PREFIX"
     mv -- "$TARGET_PREFIX.new" "$TARGET_PREFIX"
 }

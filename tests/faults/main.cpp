@@ -31,7 +31,7 @@ void List() {
 bool SweepAll(const sweep::Options& options, const std::string& program) {
     sweep::Totals totals;
     for (const sweep::Operation& operation : sweep::Operations()) {
-        const sweep::Totals own = sweep::Sweeper(operation, program, std::cout).Sweep("", options.pairs);
+        const sweep::Totals own = sweep::Sweeper(operation, program, std::cout).Sweep("", sweep::Part(), options.pairs);
         std::cout << "sweep " << operation.name << ": " << own.Text() << std::endl;
         totals.Add(own);
     }
@@ -61,7 +61,7 @@ bool Execute(const sweep::Options& options, const std::string& program) {
     if (!options.scenario.empty()) {
         ScenarioOf(*operation, options.scenario);
     }
-    const sweep::Totals totals = sweeper.Sweep(options.scenario, options.pairs);
+    const sweep::Totals totals = sweeper.Sweep(options.scenario, options.part, options.pairs);
     std::cout << "sweep " << operation->name << ": " << totals.Text() << std::endl;
     return totals.failures == 0;
 }

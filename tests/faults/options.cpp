@@ -7,6 +7,7 @@ namespace sweep {
 const char* const kUsage =
     "sweep                                     all operations\n"
     "sweep --operation NAME [--scenario NAME]  one of them\n"
+    "      --part NUMBER/PARTS                 every so manyth of its scenarios, without a look at the edges\n"
     "      --no-pairs                          single failures only\n"
     "      --fail CALL=VALUE ...               one run: this call fails by -1, null, false, throws, ...\n"
     "      --sticky                            ... and each later call of the same function\n"
@@ -17,13 +18,25 @@ const char* const kUsage =
 
 namespace {
 
-std::size_t ToPlace(const std::string& text) {
+std::size_t ToNumber(const std::string& text) {
     std::size_t used = 0;
-    const unsigned long place = std::stoul(text, &used);
+    const unsigned long number = std::stoul(text, &used);
     if (used != text.size()) {
-        throw std::invalid_argument("no place of a call: " + text);
+        throw std::invalid_argument("no number: " + text);
     }
-    return place;
+    return number;
+}
+
+Part ToPart(const std::string& text) {
+    const std::size_t slash = text.find('/');
+    if (slash == std::string::npos) {
+        throw std::invalid_argument("--part takes NUMBER/PARTS");
+    }
+    const Part part{ToNumber(text.substr(0, slash)), ToNumber(text.substr(slash + 1))};
+    if (part.number == 0 || part.number > part.of) {
+        throw std::invalid_argument("there is no part " + text);
+    }
+    return part;
 }
 
 fake::Fault ToFault(const std::string& text) {
@@ -49,7 +62,7 @@ Point ToPoint(const std::string& text) {
     if (equals == std::string::npos) {
         throw std::invalid_argument("--fail takes CALL=VALUE");
     }
-    return {ToPlace(text.substr(0, equals)), ToFault(text.substr(equals + 1))};
+    return {ToNumber(text.substr(0, equals)), ToFault(text.substr(equals + 1))};
 }
 
 }  // namespace
@@ -68,11 +81,13 @@ Options ParseOptions(int count, const char* const* arguments) {
             options.operation = value();
         } else if (name == "--scenario") {
             options.scenario = value();
+        } else if (name == "--part") {
+            options.part = ToPart(value());
         } else if (name == "--fail") {
             options.plan.points.push_back(ToPoint(value()));
             options.single = true;
         } else if (name == "--from") {
-            options.plan.from = ToPlace(value());
+            options.plan.from = ToNumber(value());
             options.single = true;
         } else if (name == "--sticky") {
             options.plan.sticky = true;
@@ -90,6 +105,9 @@ Options ParseOptions(int count, const char* const* arguments) {
     }
     if (options.single && (options.operation.empty() || options.scenario.empty())) {
         throw std::invalid_argument("one run needs --operation and --scenario");
+    }
+    if (options.part.of > 1 && (options.operation.empty() || !options.scenario.empty())) {
+        throw std::invalid_argument("--part goes with --operation alone");
     }
     return options;
 }

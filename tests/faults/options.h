@@ -12,6 +12,7 @@ namespace sweep {
 struct Options {
     std::string operation;  // empty: all
     std::string scenario;   // empty: all
+    Part part;              // of the scenarios
     Plan plan;
     bool single = false;  // one run with `plan`, shown call by call
     bool pairs = true;

@@ -18,6 +18,12 @@ struct Point {
     fake::Fault fault;
 };
 
+// Every `of`th scenario, from that of this number on, the first being 1: a long sweep can run in several processes.
+struct Part {
+    std::size_t number = 1;
+    std::size_t of = 1;
+};
+
 // Which calls fail.
 struct Plan {
     // As the program's options: "--fail 17=-1 --sticky".

@@ -190,7 +190,7 @@ bool SelfTest(std::ostream& out) {
     std::size_t found = 0;
     for (const Case& one : cases) {
         std::ostringstream report;
-        Sweeper(one.operation, "sweep", report).Sweep("", false);
+        Sweeper(one.operation, "sweep", report).Sweep("", Part(), false);
         if (report.str().find(std::string(": ") + one.oracle + ": ") != std::string::npos) {
             ++found;
         } else {

@@ -47,14 +47,15 @@ Sweeper::Sweeper(const Operation& itsOperation, std::string itsProgram, std::ost
       out(itsOut),
       known(operation.functions.begin(), operation.functions.end()) {}
 
-Totals Sweeper::Sweep(const std::string& scenario, bool pairs) {
+Totals Sweeper::Sweep(const std::string& scenario, const Part& part, bool pairs) {
     const auto begin = std::chrono::steady_clock::now();
-    for (const Scenario& one : operation.scenarios) {
-        if (scenario.empty() || one.name == scenario) {
+    for (std::size_t i = 0; i < operation.scenarios.size(); ++i) {
+        const Scenario& one = operation.scenarios[i];
+        if (scenario.empty() ? i % part.of == part.number - 1 : one.name == scenario) {
             SweepScenario(one, pairs);
         }
     }
-    if (scenario.empty()) {
+    if (scenario.empty() && part.of == 1) {
         CheckEdges();
     }
     totals.seconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - begin).count();

@@ -35,8 +35,9 @@ public:
     // Failures are written to `out`, each with the options that repeat it behind `program`.
     Sweeper(const Operation& itsOperation, std::string itsProgram, std::ostream& itsOut);
 
-    // All scenarios and the edges, or one scenario only, when its name is not empty. Without pairs it is a quick look.
-    Totals Sweep(const std::string& scenario, bool pairs);
+    // All scenarios and the edges; or one scenario, when its name is not empty, or a part of them. Without pairs it is a
+    // quick look.
+    Totals Sweep(const std::string& scenario, const Part& part, bool pairs);
 
     // One run, shown call by call. True when all is well.
     bool Show(const Scenario& scenario, const Plan& plan);
