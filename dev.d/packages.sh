@@ -8,8 +8,8 @@ APPLIANCE_PACKAGES=(pkg-config libboost1.81-dev libcli11-dev libkrb5-dev libldap
 BUILD_PACKAGES=("${MODULE_PACKAGES[@]}" "${APPLIANCE_PACKAGES[@]}")
 TEST_PACKAGES=("${BUILD_PACKAGES[@]}" libgtest-dev libgmock-dev)
 # The appliance without a domain is tested with Samba's own reader of configuration files beside it.
-PLATFORM_PACKAGES=("${TEST_PACKAGES[@]}" acl python3 samba samba-common-bin winbind)
-RELEASE_PACKAGES=("${TEST_PACKAGES[@]}" libbenchmark-dev binutils python3 valgrind)
+PLATFORM_PACKAGES=("${TEST_PACKAGES[@]}" acl iproute2 python3 samba samba-common-bin winbind)
+RELEASE_PACKAGES=("${TEST_PACKAGES[@]}" libbenchmark-dev abigail-tools binutils python3 valgrind)
 CLANG_PACKAGES=("${BUILD_PACKAGES[@]}" clang)
 LINT_PACKAGES=("${CLANG_PACKAGES[@]}" clang-tidy)
 FUZZ_PACKAGES=("${CLANG_PACKAGES[@]}" libclang-rt-14-dev)
@@ -26,6 +26,13 @@ LAB_PACKAGES=(samba winbind samba-dsdb-modules samba-vfs-modules samba-ad-provis
 E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils openssl python3-pytest python3-pytest-xdist wrk)
 # The browser for the tests of the page; what they are written for is Debian's own.
 BROWSER_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" chromium)
+# The module for the target: a compiler for it, its emulator, and the sources of the JSON library that Debian has none of.
+TARGET_PACKAGES=("${MODULE_PACKAGES[@]}" g++-powerpc-linux-gnu qemu-user googletest abigail-tools binutils dpkg-dev python3)
+# The files for others.
+PACKAGE_PACKAGES=("${BUILD_PACKAGES[@]}" "${TARGET_PACKAGES[@]}" debhelper xz-utils)
+# They are installed, run and removed on a machine of their own, made from a bare Debian root.
+PACKAGE_TEST_PACKAGES=("${PACKAGE_PACKAGES[@]}" "${FRESH_PACKAGES[@]}" curl git iproute2 lintian
+    python3-pytest util-linux)
 # realmd and adcli are measured beside the appliance; realmd answers on a message bus.
 APPLIANCE_BENCH_PACKAGES=("${RELEASE_PACKAGES[@]}" "${LAB_PACKAGES[@]}" realmd adcli dbus)
 
@@ -35,6 +42,7 @@ packages_of_preset() {
         coverage) printf '%s\n' "${COVERAGE_PACKAGES[@]}" ;;
         fuzz) printf '%s\n' "${FUZZ_PACKAGES[@]}" ;;
         release) printf '%s\n' "${RELEASE_PACKAGES[@]}" ;;
+        powerpc*) printf '%s\n' "${TARGET_PACKAGES[@]}" ;;
     esac
 }
 

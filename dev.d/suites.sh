@@ -1,7 +1,7 @@
 # The suites of "./dev test". Each one runs as a process of its own (suite.sh) and leaves its counts with "count".
 # shellcheck shell=bash disable=SC2034,SC2153 # variables shared with the files that read this one
 
-SUITES=(format shell clang lint unit corpus sweep threads coverage library platform console lab browser)
+SUITES=(format shell clang lint unit corpus sweep threads coverage library target platform console lab browser package)
 QUICK_SUITES=(format shell unit corpus library)
 
 about_suite() {
@@ -16,8 +16,10 @@ about_suite() {
         threads) say "requests on several threads, with the thread sanitizer" ;;
         coverage) say "the unit tests reach every line and every branch of src/" ;;
         library) say "the built library: symbols, linking, loading, all operations in a host" ;;
+        target) say "the module for a 32-bit big-endian machine, under qemu: tests, sweep, inputs, the built library" ;;
         lab) say "the appliance in real domains: joins, tests, lists, refreshes, faults, kills" ;;
         console) say "the page's own tests, its types, eslint and prettier" ;;
+        package) say "what others install: made twice, looked at, installed and removed on machines of its own" ;;
         browser) say "the page in Chromium: every view and state imitated, the whole life in a real domain, axe-core" ;;
         platform) say "the appliance on Debian without a domain, with address and undefined-behaviour sanitizers" ;;
     esac
@@ -41,9 +43,11 @@ packages_of_suite() {
         platform) printf '%s\n' "${PLATFORM_PACKAGES[@]}" ;;
         lab) printf '%s\n' "${E2E_PACKAGES[@]}" ;;
         browser) printf '%s\n' "${BROWSER_PACKAGES[@]}" ;;
+        package) printf '%s\n' "${PACKAGE_TEST_PACKAGES[@]}" ;;
         unit | corpus | sweep | threads) printf '%s\n' "${TEST_PACKAGES[@]}" ;;
         coverage) printf '%s\n' "${COVERAGE_PACKAGES[@]}" ;;
         library) printf '%s\n' "${RELEASE_PACKAGES[@]}" ;;
+        target) printf '%s\n' "${TARGET_PACKAGES[@]}" ;;
     esac
 }
 
@@ -279,4 +283,16 @@ show_progress() {
 sum_of_results() {
     sed -n 's/.*<testsuite [^>]*errors="\([0-9]*\)" failures="\([0-9]*\)" skipped="\([0-9]*\)" tests="\([0-9]*\)".*/\4 \1 \2 \3/p' \
         "$1" | awk '{ tests += $1; failed += $2 + $3 + $4 } END { print tests + 0, failed + 0 }'
+}
+
+suite_target() {
+    # shellcheck source=dev.d/target_suite.sh
+    . "$ROOT/dev.d/target_suite.sh"
+    test_target
+}
+
+suite_package() {
+    # shellcheck source=dev.d/package_suite.sh
+    . "$ROOT/dev.d/package_suite.sh"
+    test_packages
 }

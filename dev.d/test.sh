@@ -9,11 +9,13 @@ done
 usage() {
     cat <<'TEXT'
 usage: ./dev test [--quick] [--deadline SECONDS] [SUITE...]
+       ./dev test --target powerpc [--deadline SECONDS]
 
 Installs what is missing, builds, and runs the suites. At the end come a table and a line "N passed, N failed", which
 counts test cases and checked files. The exit code is 1 when anything failed, also when a suite found no tests.
 
   --quick              only the suites marked with *
+  --target powerpc     only the suite "target", which is for that machine
   --deadline SECONDS   end a suite that takes longer; each has a deadline of its own otherwise
 
 Suites, all of them unless some are named:
@@ -27,7 +29,7 @@ TEXT
 }
 
 main() {
-    local chosen=() deadline="" quick=false suite
+    local chosen=() deadline="" quick=false target=false suite
     while (($# > 0)); do
         case $1 in
             -h | --help)
@@ -35,6 +37,11 @@ main() {
                 return
                 ;;
             --quick) quick=true ;;
+            --target)
+                [[ ${2:-} == powerpc ]] || wrong_usage "--target takes the name of a target: powerpc."
+                target=true
+                shift
+                ;;
             --deadline)
                 [[ ${2:-} =~ ^[1-9][0-9]*$ ]] || wrong_usage "--deadline takes a number of seconds."
                 deadline=$2
@@ -50,6 +57,12 @@ main() {
     done
     if $quick && ((${#chosen[@]} > 0)); then
         wrong_usage "Either --quick or names of suites."
+    fi
+    if $target; then
+        if $quick || ((${#chosen[@]} > 0)); then
+            wrong_usage "--target goes with --deadline only."
+        fi
+        chosen=(target)
     fi
     if ((${#chosen[@]} == 0)); then
         chosen=("${SUITES[@]}")
