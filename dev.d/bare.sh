@@ -20,8 +20,9 @@ make_bare_root() {
     root=$(mktemp -d "$CACHE/bare.XXXXXX")
     TRASH+=("$root")
     # Mounts of its own, so that whatever debootstrap leaves mounted ends with it. Certificates: the mirror may want them.
-    step --title "\$ debootstrap --variant=minbase $codename" unshare --mount debootstrap --variant=minbase \
-        --include=ca-certificates "$codename" "$root" "$mirror" || die "debootstrap could not make the bare root"
+    step --title "\$ debootstrap --variant=minbase $codename" unshare --mount --propagation unchanged \
+        bash "$ROOT/dev.d/own_mounts.sh" debootstrap --variant=minbase --include=ca-certificates "$codename" "$root" \
+        "$mirror" || die "debootstrap could not make the bare root"
     step --title "packing it for the next time" tar -C "$root" --one-file-system -cf "$archive.new" . ||
         die "the bare root could not be packed"
     mv -- "$archive.new" "$archive"

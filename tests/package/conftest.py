@@ -58,9 +58,10 @@ def space(tmp_path_factory):
 
 def inside(options, root, *words):
     """A command in a root, with this machine's network."""
-    return must(["/usr/bin/unshare", "--mount", "--pid", "--fork", "--kill-child", "/bin/bash",
-                 PROJECT / "dev.d" / "fresh_inside.sh", root, "/", options.archives, "env", "DEBIAN_FRONTEND=noninteractive",
-                 *words], deadline=600)
+    commands = PROJECT / "dev.d"
+    return must(["/usr/bin/unshare", "--mount", "--pid", "--fork", "--kill-child", "--propagation", "unchanged",
+                 "/bin/bash", commands / "own_mounts.sh", "/bin/bash", commands / "fresh_inside.sh", root, "/",
+                 options.archives, "env", "DEBIAN_FRONTEND=noninteractive", *words], deadline=600)
 
 
 @pytest.fixture(scope="session")

@@ -49,23 +49,27 @@ ip addr add 10.78.0.2/24 dev eth0
 ip link set wire0 up
 ip link set eth0 up
 
-# In a chroot, pivot_root is refused; another chroot serves as well there.
-cd "$root"
-mkdir -p tmp/outside
-move=()
-if pivot_root . tmp/outside 2>/dev/null; then
-    umount -l /tmp/outside
-    rmdir /tmp/outside
-else
-    rmdir tmp/outside
-    move=(chroot .)
-fi
-cd /
 # What reaches past the namespaces is taken from every process of the machine.
-words=("${move[@]}" env -i PATH=/usr/sbin:/usr/bin:/sbin:/bin container=vorn-package-test
+words=(env -i PATH=/usr/sbin:/usr/bin:/sbin:/bin container=vorn-package-test
     setpriv "--bounding-set=-sys_time,-sys_module,-sys_boot,-sys_rawio,-wake_alarm,-syslog")
 if [[ $kind == systemd ]]; then
-    exec "${words[@]}" /lib/systemd/systemd --log-target=journal --show-status=no
+    words+=(/lib/systemd/systemd --log-target=journal --show-status=no)
+else
+    # shellcheck disable=SC2016 # expanded by the inner shell
+    words+=(bash -c 'while true; do sleep infinity & wait "$!"; done')
 fi
+mkdir "$root/tmp/outside"
+exec {top}<"$root" {ready}>"$folder/ready"
+# In a chroot, pivot_root is refused. To enter one's own namespace leads out of it, and what is open stays open.
 # shellcheck disable=SC2016 # expanded by the inner shell
-exec "${words[@]}" bash -c 'cd / && : >/run/ready && while true; do sleep infinity & wait "$!"; done'
+exec nsenter --mount=/proc/self/ns/mnt -- bash -euc 'top=$1 ready=$2
+    shift 2
+    cd "/proc/self/fd/$top"
+    pivot_root . tmp/outside
+    cd /
+    umount -l /tmp/outside
+    rmdir /tmp/outside
+    # From now on this process is the way into the machine, and not into the one outside.
+    echo ready >&"$ready"
+    exec {top}<&- {ready}>&-
+    exec "$@"' pivot "$top" "$ready" "${words[@]}"

@@ -1,6 +1,7 @@
 #!/bin/bash
-# A machine for tests, in namespaces of its own: launch.sh ROOT FOLDER systemd|plain. Writes the id of its first process,
-# as seen from here, into FOLDER/init, and ends, with all of the machine, when its input ends.
+# A machine for tests, in namespaces of its own: launch.sh ROOT FOLDER systemd|plain, with mounts of its own. Writes the
+# id of the machine's first process, as seen from here, into FOLDER/init, and ends, with all of the machine, when its
+# input ends.
 set -uo pipefail
 trap '' HUP INT TERM
 
@@ -8,11 +9,13 @@ root=$1
 folder=$2
 kind=$3
 group=""
+reader=""
 
 clean_up() {
     local pid
     pid=$(cat -- "$folder/init" 2>/dev/null) && kill -KILL "$pid" 2>/dev/null
-    wait
+    [[ -z $reader ]] || kill -KILL "$reader" 2>/dev/null
+    wait 2>/dev/null
     if [[ -n $group ]]; then
         # A group goes when the last process in it is gone, this one included.
         printf '%d\n' "$$" >"${group%/*}/cgroup.procs"
@@ -33,16 +36,14 @@ make_group() {
     mkdir "$group" && printf '%d\n' "$$" >"$group/cgroup.procs"
 }
 
-# No mount is to reach this machine. In a chroot "/" is no mount, and what is mounted below must be private already.
-if ! mount --make-rprivate / 2>/dev/null && grep -q ' shared:' /proc/self/mountinfo; then
-    printf 'mounts in this chroot are shared with the machine\n' >&2
-    exit 1
-fi
 trap clean_up EXIT
 if [[ $kind == systemd ]]; then
     make_group || { printf 'no control groups of its own can be had for the machine\n' >&2 && exit 1; }
 fi
 unshare --mount --pid --fork --net --uts --ipc --cgroup --propagation unchanged \
     bash "$(dirname -- "$0")/first.sh" "$root" "$folder" "$kind" </dev/null &
+machine=$!
 # Nothing comes: the one who writes there is alive, or gone.
-cat >/dev/null
+cat <&0 >/dev/null &
+reader=$!
+wait -n "$machine" "$reader"

@@ -7,6 +7,7 @@ import subprocess
 import time
 
 HERE = pathlib.Path(__file__).resolve().parent
+OWN_MOUNTS = HERE.parents[1] / "dev.d" / "own_mounts.sh"
 ENVIRONMENT = ["/usr/bin/env", "-i", "PATH=/usr/sbin:/usr/bin:/sbin:/bin", "HOME=/root", "LC_ALL=C.UTF-8",
                "DEBIAN_FRONTEND=noninteractive"]
 
@@ -52,13 +53,13 @@ class Machine:
         self.folder.mkdir(mode=0o755)
         # It ends with its input, so also when this process is killed.
         self.launcher = subprocess.Popen(
-            ["/usr/bin/unshare", "--mount", "--propagation", "unchanged", "/bin/bash", HERE / "launch.sh", root,
-             self.folder, kind], stdin=subprocess.PIPE, stdout=subprocess.DEVNULL, start_new_session=True,
+            ["/usr/bin/unshare", "--mount", "--propagation", "unchanged", "/bin/bash", OWN_MOUNTS, "/bin/bash",
+             HERE / "launch.sh", root, self.folder, kind], stdin=subprocess.PIPE, stdout=subprocess.DEVNULL, start_new_session=True,
             stderr=(self.folder / "errors").open("wb"))
         try:
-            ready = self.systemd_is_up if kind == "systemd" else self.is_ready
-            until(lambda: self.launcher.poll() is not None or ready(), 60, "the machine comes up")
-            assert self.launcher.poll() is None, (self.folder / "errors").read_text(encoding="utf-8")
+            self.wait_until(self.is_itself)
+            if kind == "systemd":
+                self.wait_until(self.systemd_is_up)
         except BaseException:
             self.end()
             raise
@@ -73,8 +74,14 @@ class Machine:
     def __exit__(self, *_):
         self.end()
 
-    def is_ready(self):
-        return self.path("/run/ready").exists()
+    def wait_until(self, condition):
+        until(lambda: self.launcher.poll() is not None or condition(), 60, "the machine comes up")
+        assert self.launcher.poll() is None, (self.folder / "errors").read_text(encoding="utf-8")
+
+    def is_itself(self):
+        """Its first process has left this machine's files behind."""
+        ready = self.folder / "ready"
+        return ready.exists() and ready.stat().st_size > 0
 
     def systemd_is_up(self):
         """Whatever is to start at its start runs, or has failed."""
