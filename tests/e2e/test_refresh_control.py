@@ -258,16 +258,18 @@ def wait_until_after(second):
 class OwnFetch:
     """The appliance's own refresh, as the scheduler runs it, standing still in its fetch until it may go on."""
 
-    def __init__(self, machine):
+    def __init__(self, machine, lab):
         self.machine = machine
         machine.must("rm", "-f", EXIT_CODE)
         # Whoever waits for a process that is stopped is stopped with it, so nobody waits.
         script = "(env -i /usr/vorn/sbin/vornwin -updateDomain; echo $? >$1) >/dev/null 2>&1 &"
-        machine.must("sh", "-c", script, "start", EXIT_CODE)
-        machine.wait_until(lambda: fetchers(machine), 20, "the appliance's own fetch")
-        self.stopped = programs(machine, "vornwin")
-        for process in self.stopped:
-            process.signal(signal.SIGSTOP)
+        # The controller takes its time, so that no list is stored before the fetch stands still.
+        with lab.fault("slow", only=machine.host):
+            machine.must("sh", "-c", script, "start", EXIT_CODE)
+            machine.wait_until(lambda: fetchers(machine), 20, "the appliance's own fetch")
+            self.stopped = programs(machine, "vornwin")
+            for process in self.stopped:
+                process.signal(signal.SIGSTOP)
 
     def end(self):
         """Lets it go on to its end, and answers the exit code."""
@@ -278,20 +280,20 @@ class OwnFetch:
 
 
 @contextlib.contextmanager
-def own_fetch(machine):
-    fetch = OwnFetch(machine)
+def own_fetch(machine, lab):
+    fetch = OwnFetch(machine, lab)
     try:
         yield fetch
     finally:
         fetch.end()
 
 
-def test_beside_a_fetch_of_the_appliances_own(member):
+def test_beside_a_fetch_of_the_appliances_own(member, lab):
     client, before = member.client, lists(member)
     # Lists tell their age in whole seconds.
     wait_until_after(max(row["fetched"] for row in before.values()))
     member.must("rm", "-f", MARKER)
-    with own_fetch(member) as fetch:
+    with own_fetch(member, lab) as fetch:
         assert not member.exists(MARKER)
         pid = member.read(PID_FILES[0])
         task = client.start_refresh("LAB").data["task_id"]
@@ -311,9 +313,9 @@ def test_beside_a_fetch_of_the_appliances_own(member):
         assert_quiet(member)
 
 
-def test_stopping_ends_the_waiting_and_not_the_appliances_own_fetch(member):
+def test_stopping_ends_the_waiting_and_not_the_appliances_own_fetch(member, lab):
     client, began = member.client, time.time()
-    with own_fetch(member) as fetch:
+    with own_fetch(member, lab) as fetch:
         task = client.start_refresh().data["task_id"]
         assert client.call(DOMAIN, 1, "update_stop").ok
         assert client.refresh_status(task).code == 121
