@@ -90,6 +90,16 @@ void ClientConnection::WaitFor(Kind what) {
         });
 }
 
+// For a step that can't go on now, or never.
+bool ClientConnection::WaitOrClose(Kind what) {
+    if (what == Kind::Ended) {
+        Close();
+    } else {
+        WaitFor(what);
+    }
+    return false;
+}
+
 void ClientConnection::Enter(State state, std::chrono::milliseconds limit) {
     state_ = state;
     since_ = Clock::now();
@@ -183,12 +193,7 @@ bool ClientConnection::StepAnswer() {
         }
         return true;
     }
-    if (result.kind == Kind::Ended) {
-        Close();
-    } else {
-        WaitFor(result.kind);
-    }
-    return false;
+    return WaitOrClose(result.kind);
 }
 
 void ClientConnection::OnAnswered() {
@@ -224,12 +229,7 @@ bool ClientConnection::StepLinger() {
     if (result.kind == Kind::Done) {
         return true;
     }
-    if (result.kind == Kind::Ended) {
-        Close();
-    } else {
-        WaitFor(result.kind);
-    }
-    return false;
+    return WaitOrClose(result.kind);
 }
 
 void ClientConnection::Tick(Clock::time_point now) {

@@ -87,6 +87,7 @@ private:
     void BecomeIdle();
     void Linger();
     void WaitFor(ClientStream::Result::Kind what);
+    bool WaitOrClose(ClientStream::Result::Kind what);
     void Consume(std::size_t count);
 
     const std::unique_ptr<ClientStream> stream_;

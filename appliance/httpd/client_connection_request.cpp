@@ -36,12 +36,7 @@ bool ClientConnection::Read() {
         explicit_bzero(piece.data(), result.size);
         return true;
     }
-    if (result.kind == Kind::Ended) {
-        Close();
-    } else {
-        WaitFor(result.kind);
-    }
-    return false;
+    return WaitOrClose(result.kind);
 }
 
 bool ClientConnection::StepHeader() {
@@ -111,12 +106,7 @@ bool ClientConnection::StepContinue() {
         }
         return true;
     }
-    if (result.kind == Kind::Ended) {
-        Close();
-    } else {
-        WaitFor(result.kind);
-    }
-    return false;
+    return WaitOrClose(result.kind);
 }
 
 bool ClientConnection::StepBody() {
