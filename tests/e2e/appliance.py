@@ -2,7 +2,9 @@
 
 import contextlib
 import hashlib
+import socket
 import time
+import uuid
 
 from client import Client
 
@@ -16,6 +18,8 @@ CONFIGURATION = (
     "/usr/vorn/etc/schedule.conf",
     "/etc/cron.d/vorn",
 )
+USER_DEBUG = 8 + 7
+MARK = "the tests were here: "
 SMBINFO = "/usr/vorn/etc/smbinfo.conf"
 
 
@@ -110,7 +114,17 @@ class Appliance:
         return pairs
 
     def syslog(self):
-        return (self.read("/var/log/syslog") or b"").decode(errors="backslashreplace")
+        """All that was said to the system log before this call, without the mark that tells when it is all there."""
+        mark = f"{MARK}{uuid.uuid4()}"
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as log:
+            log.sendto(f"<{USER_DEBUG}>{mark}".encode(), str(self.path("/dev/log")))
+        end = time.monotonic() + 10
+        while True:
+            lines = (self.read("/var/log/syslog") or b"").decode(errors="backslashreplace").splitlines(keepends=True)
+            if any(line.endswith(f"{mark}\n") for line in lines):
+                return "".join(line for line in lines if MARK not in line)
+            assert time.monotonic() < end, "the system log does not write what it is told"
+            time.sleep(0.02)
 
     def option_of_samba(self, key):
         """What the file-sharing service takes for the value of a key."""

@@ -265,11 +265,15 @@ def test_a_fault_in_the_middle_of_questions_and_a_refresh(lab, member, name):
         calls.start("refresh", member.client.refresh)
         member.wait_until(lambda: member.exists("/tmp/domain_user.pid"), 20, "a fetch")
         with held(lambda: tasks(member)):
-            calls.ask()
-            member.wait_until(lambda: programs(member, "net") and programs(member, "wbinfo"), 10, "a question")
-            with held(lambda: tools(member)) as stopped:
-                assert stopped
-                faults.enter_context(fault(lab, name))
+            # A question takes some milliseconds: it is caught because its answer is slow, winbind's does not come yet.
+            with held(lambda: programs(member, "winbindd")), lab.fault("slow", "dc1"):
+                calls.ask()
+                member.wait_until(lambda: programs(member, "net") and programs(member, "wbinfo"), 10, "a question")
+                stopped = faults.enter_context(contextlib.ExitStack())
+                caught = stopped.enter_context(held(lambda: tools(member)))
+            assert {process.name for process in caught.values()} >= {"net", "wbinfo"}
+            faults.enter_context(fault(lab, name))
+            stopped.close()
         answers = calls.end()
         assert answers["test_dc"].data == {"test_join_success": False}
         assert answers["list"].data == {"domain_list": KNOWN}

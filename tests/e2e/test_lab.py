@@ -205,8 +205,10 @@ def test_a_command_ends_with_the_one_who_runs_it(lab):
 
 def test_system_log_is_received(lab):
     assert lab.exec("nas1", "logger", "-t", "test", "a line of the test").code == 0
-    log = lab.exec("nas1", "cat", "/var/log/syslog").out
-    assert re.search(r"nas1 .*test: a line of the test", log), log
+    deadline = time.monotonic() + 10
+    while not re.search(r"nas1 .*test: a line of the test", lab.exec("nas1", "cat", "/var/log/syslog").out):
+        assert time.monotonic() < deadline
+        time.sleep(0.1)
 
 
 def test_cron_runs_tables(lab):
