@@ -260,20 +260,20 @@ def test_a_fault_in_the_middle_of_a_join(lab, newcomer, step, name, codes):
 @pytest.mark.parametrize("name", ["frozen", "killed"])
 def test_a_fault_in_the_middle_of_questions_and_a_refresh(lab, member, name):
     before = lists(member)
-    with contextlib.ExitStack() as faults:
+    with contextlib.ExitStack() as faults, contextlib.ExitStack() as stopped:
         calls = Calls(member)
-        calls.start("refresh", member.client.refresh)
-        member.wait_until(lambda: member.exists("/tmp/domain_user.pid"), 20, "a fetch")
-        with held(lambda: tasks(member)):
-            # A question takes some milliseconds: it is caught because its answer is slow, winbind's does not come yet.
-            with held(lambda: programs(member, "winbindd")), lab.fault("slow", "dc1"):
+        # A question takes some milliseconds: it is caught because its answer is slow, winbind's does not come yet.
+        with lab.fault("slow", "dc1"):
+            calls.start("refresh", member.client.refresh)
+            member.wait_until(lambda: member.exists("/tmp/domain_user.pid"), 20, "a fetch")
+            assert stopped.enter_context(held(lambda: tasks(member)))
+            with held(lambda: programs(member, "winbindd")):
                 calls.ask()
                 member.wait_until(lambda: programs(member, "net") and programs(member, "wbinfo"), 10, "a question")
-                stopped = faults.enter_context(contextlib.ExitStack())
                 caught = stopped.enter_context(held(lambda: tools(member)))
             assert {process.name for process in caught.values()} >= {"net", "wbinfo"}
-            faults.enter_context(fault(lab, name))
-            stopped.close()
+        faults.enter_context(fault(lab, name))
+        stopped.close()
         answers = calls.end()
         assert answers["test_dc"].data == {"test_join_success": False}
         assert answers["list"].data == {"domain_list": KNOWN}
