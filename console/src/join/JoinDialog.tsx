@@ -3,6 +3,7 @@ import { Modal, ModalBody, ModalFooter, ModalHeader } from '@patternfly/react-co
 import { useState } from 'react';
 import { useStore } from '../api/store';
 import type { DomainState, NetworkInterface } from '../api/types';
+import { useRestored, useUnsaved } from '../api/unsaved';
 import { t } from '../texts';
 import { Finished } from './Finished';
 import { forgetJob, job, lastForm, startJoin } from './job';
@@ -21,17 +22,24 @@ interface JoinDialogProps {
 
 const kForm = 'join-form';
 
+// Whether there is more in the form than it began with.
+function isEntered(form: JoinForm, domain: DomainState): boolean {
+  return JSON.stringify({ ...form, password: '' }) !== JSON.stringify(startValues(domain));
+}
+
 // Asks for what a join needs, shows its steps while it runs, and what came of it. Can be closed at any time: a join that
 // runs goes on.
 export function JoinDialog({ domain, interfaces, onClose }: JoinDialogProps) {
   const now = useStore(job);
-  const [form, setForm] = useState<JoinForm>(() => lastForm.get() ?? startValues(domain));
+  const restored = useRestored<JoinForm>(kForm);
+  const [form, setForm] = useState<JoinForm>(() => restored ?? lastForm.get() ?? startValues(domain));
   const [insist, setInsist] = useState(false);
   const [unfolded, setUnfolded] = useState(advancedCount(form) > 0);
   const [attempts, setAttempts] = useState(0);
   const running = now.state === 'running' && now.action === 'join';
   const done = now.state === 'done' && now.action === 'join';
   const record = useSteps(running);
+  useUnsaved(kForm, !done && isEntered(form, domain) ? { ...form, password: '' } : null);
 
   const problems = checkForm(form);
   const change = (part: Partial<JoinForm>) => setForm((before) => ({ ...before, ...part }));
@@ -86,6 +94,7 @@ export function JoinDialog({ domain, interfaces, onClose }: JoinDialogProps) {
             onUnfold={setUnfolded}
             onSubmit={submit}
             failure={failed}
+            restored={restored !== undefined && now.state === 'idle'}
           />
         )}
       </ModalBody>

@@ -20,6 +20,8 @@ interface JoinFormViewProps extends FieldsProps {
   onUnfold: (unfolded: boolean) => void;
   onSubmit: () => void;
   failure: Extract<Job, { state: 'failed' }> | null;
+  // The session had ended, and what was entered before is in the form again.
+  restored: boolean;
 }
 
 // The dialog's form, with what went wrong with the attempt before.
@@ -39,6 +41,11 @@ export function JoinFormView(props: JoinFormViewProps) {
       }}
     >
       {failure !== null && <Failure key={String(failure.record?.id)} job={failure} />}
+      {props.restored && (
+        <div role="status">
+          <Alert isInline isPlain variant="info" component="p" title={t('join.restored')} />
+        </div>
+      )}
       {failure === null && member !== null && (
         <Alert
           isInline

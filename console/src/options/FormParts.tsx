@@ -53,10 +53,18 @@ export function SaveBar({ changes, busy, problem, onDiscard }: SaveBarProps) {
   );
 }
 
+interface OutcomeProps {
+  saved: boolean;
+  // The session had ended, and what was not saved is in the form again.
+  restored: boolean;
+  children?: ReactNode;
+}
+
 // A place for what became of saving; what appears in it is read out.
-export function Outcome({ saved, children }: { saved: boolean; children?: ReactNode }) {
+export function Outcome({ saved, restored, children }: OutcomeProps) {
   return (
     <div role="status">
+      {restored && <Alert isInline variant="info" component="p" title={t('form.restored')} />}
       {saved && <Alert isInline variant="success" component="p" title={t('form.saved')} />}
       {children}
     </div>

@@ -5,6 +5,7 @@ import { HelperText, HelperTextItem } from '@patternfly/react-core/dist/esm/comp
 import { TextInput } from '@patternfly/react-core/dist/esm/components/TextInput';
 import { useEffect, useState, type FormEvent } from 'react';
 import { call } from '../api/client';
+import { useRestored, useUnsaved } from '../api/unsaved';
 import { changedOptions, parseDepth, SWITCHES, type DomainOptions, type OptionName } from '../rules/options';
 import { t } from '../texts';
 import { ErrorAlert, useCall } from '../ui';
@@ -24,7 +25,9 @@ interface OptionsFormProps {
 }
 
 export function OptionsForm({ stored, onStored }: OptionsFormProps) {
-  const [draft, setDraft] = useState<Draft>(() => draftOf(stored));
+  const kept = useRestored<Draft>('options');
+  const [draft, setDraft] = useState<Draft>(() => kept ?? draftOf(stored));
+  const [restored, setRestored] = useState(kept !== undefined);
   const [saved, setSaved] = useState(false);
 
   // Another window, another administrator or the command line has changed something.
@@ -53,21 +56,25 @@ export function OptionsForm({ stored, onStored }: OptionsFormProps) {
     SWITCHES.filter((name) => draft.switches[name] !== draft.base[name]).length + (depthChanged ? 1 : 0);
   const ready = wanted !== null && Object.keys(changes).length > 0 && draft.conflicts.length === 0;
 
+  useUnsaved('options', count > 0 ? draft : null);
+
   const edit = (change: (before: Draft) => Draft) => {
     setSaved(false);
+    setRestored(false);
     save.reset();
     setDraft((before) => ({ ...change(before), elsewhere: [] }));
   };
   const submit = (event: FormEvent) => {
     event.preventDefault();
     setSaved(false);
+    setRestored(false);
     if (ready && !save.busy) void save.run(wanted);
   };
 
   return (
     <>
       <LeaveGuard dirty={count > 0} />
-      <Outcome saved={saved}>
+      <Outcome saved={saved} restored={restored}>
         {draft.elsewhere.length > 0 && (
           <Alert isInline variant="info" component="p" title={t('options.elsewhere')}>
             <ul>

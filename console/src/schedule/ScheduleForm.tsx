@@ -9,6 +9,7 @@ import { Radio } from '@patternfly/react-core/dist/esm/components/Radio';
 import { useEffect, useState, type FormEvent } from 'react';
 import { call } from '../api/client';
 import { ApiError, codes } from '../api/error';
+import { useRestored, useUnsaved } from '../api/unsaved';
 import { Changed, Conflict, Outcome, SaveBar } from '../options/FormParts';
 import { LeaveGuard } from '../options/LeaveGuard';
 import { FROM_DATE, NEVER, ON_WEEKDAYS, type Schedule } from '../rules/schedule';
@@ -48,8 +49,10 @@ interface ScheduleFormProps {
 }
 
 export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
-  const [base, setBase] = useState(stored);
-  const [draft, setDraft] = useState<Draft>(() => draftOf(stored, today()));
+  const kept = useRestored<{ base: Schedule; draft: Draft }>('schedule');
+  const [base, setBase] = useState(kept?.base ?? stored);
+  const [draft, setDraft] = useState<Draft>(() => kept?.draft ?? draftOf(stored, today()));
+  const [restored, setRestored] = useState(kept !== undefined);
   const [saved, setSaved] = useState(false);
   const problem = problemOf(draft);
   const schedule = scheduleOf(draft);
@@ -57,6 +60,7 @@ export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
   // Stored elsewhere since, and not what is entered here either.
   const conflict =
     changed && !sameSchedule(stored, base) && (problem !== null || !sameSchedule(stored, schedule));
+  useUnsaved('schedule', changed ? { base, draft } : null);
 
   const take = (from: Schedule) => {
     setBase(from);
@@ -89,25 +93,30 @@ export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
 
   const edit = (change: Partial<Draft>) => {
     setSaved(false);
+    setRestored(false);
     save.reset();
     setDraft((before) => ({ ...before, ...change }));
   };
   const submit = (event: FormEvent) => {
     event.preventDefault();
     setSaved(false);
+    setRestored(false);
     if (changed && problem === null && !conflict && !save.busy) void save.run();
   };
 
   return (
     <>
       <LeaveGuard dirty={changed} />
-      <Outcome saved={saved} />
+      <Outcome saved={saved} restored={restored} />
       {conflict && (
         <Conflict
           title={t('form.conflict')}
           body={t('schedule.conflict', { theirs: scheduleWords(stored) })}
           onMine={() => setBase(stored)}
-          onTheirs={() => take(stored)}
+          onTheirs={() => {
+            setRestored(false);
+            take(stored);
+          }}
         />
       )}
       {save.error !== undefined && <ErrorAlert error={save.error} title={t('form.failed')} />}
@@ -150,6 +159,7 @@ export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
             problem={problem !== null ? t('form.invalid') : conflict ? t('form.conflict.first') : undefined}
             onDiscard={() => {
               setSaved(false);
+              setRestored(false);
               save.reset();
               take(stored);
             }}

@@ -241,20 +241,3 @@ imitated("what the page asks by itself does not keep the session alive", async (
     assert.ok(byItself.length > 0, "the overview never looks again");
     assert.deepEqual(byItself.filter((call) => !call.background).map((call) => call.name), []);
 });
-
-imitated("a session that ends while a form is filled in keeps nobody from logging in",
-    {state: firstState()}, async ({page, go, imitation}) => {
-        await go("/join");
-        const dialog = page.getByRole("dialog");
-        await dialog.getByRole("textbox", {name: "Domain", exact: true}).fill("lab.example.com");
-        await dialog.getByRole("textbox", {name: "Account", exact: true}).fill("Administrator");
-        await dialog.getByLabel(/^Password/).fill("secret");
-        imitation.on("set", () => {
-            imitation.endSession();
-            throw failure(220);
-        });
-        await dialog.getByRole("button", {name: "Join", exact: true}).click();
-        await expectText(page, "Your session ended. Log in to go on where you were.");
-        await logIn(page);
-        await page.getByRole("dialog", {name: "Join a domain"}).waitFor();
-    });

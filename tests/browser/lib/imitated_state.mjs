@@ -104,7 +104,7 @@ export const answers = {
         if (!accounts.some(({user, password}) => user === parameters.user && password === parameters.password)) {
             throw failure(222);
         }
-        return this.logIn();
+        return this.logIn(parameters.user);
     },
 
     link(parameters) {

@@ -74,8 +74,7 @@ export class Imitation {
         this.state.session = null;
     }
 
-    logIn() {
-        const user = this.state.accounts[0].user;
+    logIn(user = this.state.accounts[0].user) {
         this.state.session = {user, csrf: "csrf-of-the-imitation", idle_seconds: 900, expires: this.now() + 43_200};
         return this.state.session;
     }

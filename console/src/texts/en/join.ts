@@ -1,6 +1,7 @@
 export const join = {
   'join.title': 'Join a domain',
   'join.again': 'Join again or another domain',
+  'join.restored': 'Your session had ended. What you had entered is here again, but for the password.',
   'join.againHint': 'The appliance is a member of {domain}. It stays one until the new join has succeeded.',
   'join.domain': 'Domain',
   'join.domain.hint': 'For example lab.example.com, or the NetBIOS name of an NT4-style domain.',

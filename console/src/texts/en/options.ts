@@ -29,6 +29,7 @@ export const options = {
   'form.unchanged': 'Nothing is changed.',
   'form.saving': 'Saving…',
   'form.saved': 'Saved.',
+  'form.restored': 'Your session had ended. What you had not saved is here again.',
   'form.failed': 'Not saved.',
   'form.invalid': 'Correct what is marked before saving.',
   'form.discard': 'Discard changes',
