@@ -6,6 +6,7 @@
 #include <netinet/in.h>
 
 #include <array>
+#include <ctime>
 #include <map>
 #include <memory>
 #include <optional>
@@ -90,6 +91,18 @@ Json::Value Busy() {
                                                                                         : Json::Value();
 }
 
+Json::Value Clock() {
+    // Else a zone that was set since the server's start would not count.
+    tzset();
+    const std::time_t now = std::time(nullptr);
+    std::tm fields{};
+    localtime_r(&now, &fields);
+    Json::Value shown(Json::objectValue);
+    shown["time"] = Json::Int64{now};
+    shown["utc_offset"] = Json::Int64{fields.tm_gmtoff};
+    return shown;
+}
+
 }  // namespace
 
 Json::Value Overview(const Parameters& /*parameters*/) {
@@ -104,6 +117,7 @@ Json::Value Overview(const Parameters& /*parameters*/) {
     answer["interfaces"] = Interfaces();
     answer["refresh"] = ShownProgress(ReadJsonFile(kRefreshProgress));
     answer["busy"] = Busy();
+    answer["clock"] = Clock();
     return answer;
 }
 

@@ -1,6 +1,6 @@
 // VORN.Appliance.Directory: what is going on with the membership.
 //
-// overview          answers {"host_name", "computer_account", "last_test", "interfaces", "refresh", "busy"}
+// overview          answers {"host_name", "computer_account", "last_test", "interfaces", "refresh", "busy", "clock"}
 // refresh_progress  answers how far the refresh that runs is, or how the last one ended; null when there was none since
 //                   the machine's start
 // join_steps        answers the steps of the last join or leave, or null when there was none since the machine's start

@@ -157,6 +157,7 @@ export interface Overview {
     errors: RefreshError[];
   } | null;
   busy: 'join' | 'leave' | null;
+  clock: { time: number; utc_offset: number };
 }
 
 export interface LeaveParameters {

@@ -2,7 +2,7 @@ import { describe, expect, it } from 'vitest';
 import type { Schedule } from './schedule';
 import { NEVER, parseDate, parseWeekName, runHours, toSchedule } from './schedule';
 import type { WallTime } from './scheduleRuns';
-import { nextRuns, wallTime, weekdayOf } from './scheduleRuns';
+import { clockOf, nextRuns, wallTime, weekdayOf } from './scheduleRuns';
 
 const weekly = (week_name: string, more: Partial<Schedule> = {}) =>
   toSchedule({ date_type: 0, week_name, hour: 3, min: 30, ...more });
@@ -99,12 +99,20 @@ it('knows the day of the week', () => {
   expect(weekdayOf({ year: 2000, month: 2, day: 29 })).toBe(2);
 });
 
-it('takes the time of the day from the clock at hand', () => {
-  expect(wallTime(new Date(2026, 10, 22, 3, 5))).toEqual({
-    year: 2026,
-    month: 11,
-    day: 22,
-    hour: 3,
+it('takes the time of the day from the clock of the appliance', () => {
+  const here = Date.UTC(2026, 10, 22, 12, 0);
+  const wall = (time: number, offset: number, later = 0) =>
+    wallTime(clockOf({ time: time / 1000, utc_offset: offset }, here), here + later);
+  expect(wall(here, 0)).toEqual({ year: 2026, month: 11, day: 22, hour: 12, minute: 0 });
+  // Another zone, another day.
+  expect(wall(here, 13 * 3600)).toEqual({ year: 2026, month: 11, day: 23, hour: 1, minute: 0 });
+  expect(wall(here, -20700)).toEqual({ year: 2026, month: 11, day: 22, hour: 6, minute: 15 });
+  // A wrong clock, and ten minutes later.
+  expect(wall(Date.UTC(1970, 0, 1, 0, 55), 0, 600_000)).toEqual({
+    year: 1970,
+    month: 1,
+    day: 1,
+    hour: 1,
     minute: 5,
   });
 });

@@ -95,13 +95,26 @@ export function nextRuns(schedule: Schedule, now: WallTime, count: number): Wall
   return runs;
 }
 
-// What a clock beside the browser shows.
-export function wallTime(date: Date): WallTime {
+// The appliance's clock: by how much it is ahead of this computer's, in milliseconds, and its time zone of UTC's, in
+// seconds.
+export interface Clock {
+  ahead: number;
+  zone: number;
+}
+
+// Of what the appliance has told at `now`, in milliseconds since 1970 by this computer.
+export function clockOf(told: { time: number; utc_offset: number }, now: number): Clock {
+  return { ahead: told.time * 1000 - now, zone: told.utc_offset };
+}
+
+// What a clock beside the appliance shows at `now`, in milliseconds since 1970 by this computer.
+export function wallTime(clock: Clock, now: number): WallTime {
+  const date = new Date(now + clock.ahead + clock.zone * 1000);
   return {
-    year: date.getFullYear(),
-    month: date.getMonth() + 1,
-    day: date.getDate(),
-    hour: date.getHours(),
-    minute: date.getMinutes(),
+    year: date.getUTCFullYear(),
+    month: date.getUTCMonth() + 1,
+    day: date.getUTCDate(),
+    hour: date.getUTCHours(),
+    minute: date.getUTCMinutes(),
   };
 }

@@ -1,5 +1,5 @@
 import { NEVER, type Schedule } from '../rules/schedule';
-import { nextRuns, wallTime } from '../rules/scheduleRuns';
+import { nextRuns, wallTime, type Clock } from '../rules/scheduleRuns';
 import { t } from '../texts';
 import { useNow } from '../ui';
 import { runWords, scheduleWords } from './words';
@@ -7,10 +7,16 @@ import { runWords, scheduleWords } from './words';
 const kRuns = 3;
 const kTick = 20_000;
 
-// The schedule in words and its next runs, as it is being filled in; null: it can't be.
-export function Preview({ schedule }: { schedule: Schedule | null }) {
-  const now = useNow(kTick);
-  const runs = schedule === null ? [] : nextRuns(schedule, wallTime(new Date(now)), kRuns);
+interface PreviewProps {
+  // Null: it can't be.
+  schedule: Schedule | null;
+  clock: Clock;
+}
+
+// The schedule in words and its next runs, as it is being filled in.
+export function Preview({ schedule, clock }: PreviewProps) {
+  const now = wallTime(clock, useNow(kTick));
+  const runs = schedule === null ? [] : nextRuns(schedule, now, kRuns);
   const scheduled = schedule !== null && schedule.date_type !== NEVER;
   return (
     <section className="vorn-schedule__preview" aria-label={t('schedule.preview')}>
@@ -26,7 +32,7 @@ export function Preview({ schedule }: { schedule: Schedule | null }) {
               <li key={runWords(run)}>{runWords(run)}</li>
             ))}
           </ol>
-          <p className="vorn-list__subtle">{t('schedule.runs.clock')}</p>
+          <p className="vorn-list__subtle">{t('schedule.runs.clock', { now: runWords(now) })}</p>
         </>
       )}
     </section>

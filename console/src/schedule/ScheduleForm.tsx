@@ -13,7 +13,7 @@ import { useRestored, useUnsaved } from '../api/unsaved';
 import { Changed, Conflict, Outcome, SaveBar } from '../options/FormParts';
 import { LeaveGuard } from '../options/LeaveGuard';
 import { FROM_DATE, NEVER, ON_WEEKDAYS, type Schedule } from '../rules/schedule';
-import { wallTime } from '../rules/scheduleRuns';
+import { wallTime, type Clock } from '../rules/scheduleRuns';
 import { t } from '../texts';
 import { ErrorAlert, useCall } from '../ui';
 import {
@@ -32,8 +32,8 @@ import { readStored, type Stored } from './stored';
 import { scheduleWords } from './words';
 import './schedule.css';
 
-function today(): string {
-  const { year, month, day } = wallTime(new Date());
+function today(clock: Clock): string {
+  const { year, month, day } = wallTime(clock, Date.now());
   return fieldDate(`${year}/${month}/${day}`);
 }
 
@@ -45,13 +45,14 @@ const kKinds: readonly [Kind, 'schedule.kind.never' | 'schedule.kind.weekdays' |
 
 interface ScheduleFormProps {
   stored: Schedule;
+  clock: Clock;
   onStored: (stored: Stored) => void;
 }
 
-export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
+export function ScheduleForm({ stored, clock, onStored }: ScheduleFormProps) {
   const kept = useRestored<{ base: Schedule; draft: Draft }>('schedule');
   const [base, setBase] = useState(kept?.base ?? stored);
-  const [draft, setDraft] = useState<Draft>(() => kept?.draft ?? draftOf(stored, today()));
+  const [draft, setDraft] = useState<Draft>(() => kept?.draft ?? draftOf(stored, today(clock)));
   const [restored, setRestored] = useState(kept !== undefined);
   const [saved, setSaved] = useState(false);
   const problem = problemOf(draft);
@@ -64,7 +65,7 @@ export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
 
   const take = (from: Schedule) => {
     setBase(from);
-    setDraft(draftOf(from, today()));
+    setDraft(draftOf(from, today(clock)));
   };
   // Nothing of one's own stands in the way of what was stored elsewhere.
   useEffect(() => {
@@ -143,7 +144,7 @@ export function ScheduleForm({ stored, onStored }: ScheduleFormProps) {
         {draft.kind !== NEVER && (
           <TimeFields draft={draft} problem={problem} disabled={save.busy} onChange={edit} />
         )}
-        <Preview schedule={problem === null ? schedule : null} />
+        <Preview schedule={problem === null ? schedule : null} clock={clock} />
         {changed && <Changed stored={scheduleWords(base)} />}
         {draft.kind === NEVER && base.date_type !== NEVER && (
           <FormHelperText>

@@ -1,7 +1,7 @@
 import { fireEvent, render, screen, within } from '@testing-library/react';
 import userEvent from '@testing-library/user-event';
 import { beforeEach, describe, expect, it } from 'vitest';
-import type { Schedule } from '../api/types';
+import type { Overview, Schedule } from '../api/types';
 import { imitate, kMember, Refusal, type Handlers } from '../rules/imitated';
 import { toSchedule } from '../rules/schedule';
 import { draftOf, parametersOf, sameSchedule } from './draft';
@@ -18,10 +18,24 @@ const kSunday = {
   week_name: '0',
 } as const;
 let stored: Schedule;
+let clock: Overview['clock'];
+
+function overview(): Overview {
+  return {
+    host_name: 'NAS1',
+    computer_account: 'NAS1$',
+    last_test: null,
+    interfaces: [],
+    refresh: null,
+    busy: null,
+    clock,
+  };
+}
 
 function show(more: Handlers = {}) {
   const appliance = imitate({
     'domain.get': () => kMember,
+    'directory.overview': () => overview(),
     'schedule.get': () => stored,
     'schedule.set': (parameters) => {
       stored =
@@ -43,9 +57,20 @@ const choose = (label: string, option: string) =>
 
 beforeEach(() => {
   stored = { ...kSunday };
+  clock = { time: Date.now() / 1000, utc_offset: 0 };
 });
 
 describe('the form', () => {
+  it('counts the next runs from the time of the appliance, and says it', async () => {
+    stored = { ...kSunday, week_name: '0,1,2,3,4,5,6' };
+    // A Tuesday of another year, in a zone where it is past the run already.
+    clock = { time: Date.UTC(2031, 4, 6, 1, 0) / 1000, utc_offset: 3 * 3600 };
+    show();
+    const [first] = await screen.findAllByRole('listitem');
+    expect(first).toHaveTextContent('Wednesday, May 7, 2031 at 03:30');
+    expect(screen.getByText(/its own clock, which shows Tuesday, May 6, 2031 at 04:00\.$/)).toBeVisible();
+  });
+
   it('shows what is stored, in words and with its next runs', async () => {
     show();
     expect(await screen.findByRole('radio', { name: 'On days of the week' })).toBeChecked();

@@ -23,7 +23,9 @@ export default function SchedulePage() {
           }
         />
       )}
-      {stored?.member === true && <ScheduleForm stored={stored.schedule} onStored={onStored} />}
+      {stored?.member === true && (
+        <ScheduleForm stored={stored.schedule} clock={stored.clock} onStored={onStored} />
+      )}
     </div>
   );
 }

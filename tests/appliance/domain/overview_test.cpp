@@ -7,7 +7,10 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cstdlib>
 #include <ctime>
+#include <string>
+#include <utility>
 
 #include "appliance/base/file_lock.h"
 #include "appliance/base/paths.h"
@@ -61,7 +64,22 @@ TEST_F(OverviewTest, OfAWorkgroup) {
         EXPECT_NE(interface["name"].asString(), "lo");
         EXPECT_TRUE(interface["addresses"].isArray());
     }
-    EXPECT_EQ(overview.size(), 6U);
+    EXPECT_EQ(overview.size(), 7U);
+}
+
+TEST_F(OverviewTest, TellsTheTimeAndTheZone) {
+    const char* const before = std::getenv("TZ");
+    const std::string zone = before == nullptr ? "" : before;
+    for (const auto& [name, offset] :
+         {std::pair("UTC", 0), std::pair("ODD-5:45", 20700), std::pair("WEST+3:30", -12600)}) {
+        ASSERT_EQ(setenv("TZ", name, 1), 0);
+        const Json::Value clock = Overview()["clock"];
+        EXPECT_NEAR(static_cast<double>(clock["time"].asInt64()), static_cast<double>(std::time(nullptr)), 2) << name;
+        EXPECT_EQ(clock["utc_offset"].asInt64(), offset) << name;
+        EXPECT_EQ(clock.size(), 2U);
+    }
+    ASSERT_EQ(before == nullptr ? unsetenv("TZ") : setenv("TZ", zone.c_str(), 1), 0);
+    tzset();
 }
 
 TEST_F(OverviewTest, OfAMember) {

@@ -153,6 +153,19 @@ imitated("schedule: from a date on, several times a day", async ({page, go, imit
     assert.deepEqual([parameters.repeat, parameters.repeat_hour, parameters.last_work_hour], [2, 2, 9]);
 });
 
+imitated("schedule: the next runs are those of the appliance's clock", async ({page, go, imitation, picture}) => {
+    // Noon of the next day, far from any midnight.
+    imitation.state.utcOffset = 36 * 3600 - (imitation.now() % 86_400);
+    const there = new Date((imitation.now() + imitation.state.utcOffset) * 1000);
+    imitation.state.schedule = {date: "", date_type: 0, hour: 23, last_work_hour: 0, min: 59, repeat: 0, repeat_hour: 0,
+        week_name: "0,1,2,3,4,5,6"};
+    await go("/schedule");
+    const day = there.toLocaleDateString("en", {dateStyle: "full", timeZone: "UTC"});
+    await expectText(page.getByRole("listitem").filter({hasText: "23:59"}).first(), day);
+    await expectText(page, /its own clock, which shows .* at 12:0[0-9]\.$/);
+    await picture("schedule-clock");
+});
+
 imitated("schedule: no day, or a day that is none, is not sent", async ({page, go, imitation}) => {
     await go("/schedule");
     await page.getByRole("checkbox", {name: "Sunday"}).uncheck();

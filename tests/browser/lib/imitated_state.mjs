@@ -30,6 +30,8 @@ export function firstState() {
             domain_nested_group: 1,
             disable_domain_admins: false,
         },
+        // Of the browser, so that both clocks show the same.
+        utcOffset: new Date().getTimezoneOffset() * -60,
         schedule: {date_type: 2},
         events: [],
         steps: null,
@@ -261,6 +263,7 @@ export const answers = {
             interfaces,
             refresh,
             busy,
+            clock: {time: this.now(), utc_offset: this.state.utcOffset},
         };
     },
 };

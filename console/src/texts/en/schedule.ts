@@ -64,7 +64,7 @@ export const schedule = {
   'schedule.incomplete': 'The schedule is not complete.',
   'schedule.runs': 'Next runs',
   'schedule.runs.none': 'This time has passed: it will never run.',
-  'schedule.runs.clock': 'Seen from the clock of this computer. The appliance goes by its own.',
+  'schedule.runs.clock': 'The appliance goes by its own clock, which shows {now}.',
   'schedule.removes': 'Saving removes the schedule that is stored.',
   'schedule.conflict': 'Stored is now: {theirs}',
 } as const;
