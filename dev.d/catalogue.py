@@ -111,6 +111,9 @@ Header 8 KiB; body 64 KiB; 10 levels of JSON, no key twice in an object; 15 seco
 last; 256 connections, of which the oldest idle one makes room for a newcomer and 192 at most are of `vorn-httpd`; 64
 waiting calls. When the server is told to end, calls that wait are refused and those that run go on to their end.
 
+Over the network, besides: 10 seconds for the handshake of TLS, 60 between two requests, 60 to take an answer in, of which
+15 at most without a byte.
+
 Parameters are not converted: a number is no text, and a text is no switch. A method that gets a wrong one answers 2618.
 A parameter that a method does not know is passed over.
 
