@@ -2,6 +2,7 @@
 
 import os
 import signal
+import threading
 
 import pytest
 
@@ -15,8 +16,10 @@ def pytest_addoption(parser):
 
 
 def pytest_sessionstart(session):
-    # A shell that runs this in the background ignores Ctrl-C, and all that is started here would inherit that.
-    signal.signal(signal.SIGINT, signal.default_int_handler)
+    # A shell that runs this in the background ignores Ctrl-C, and all that is started here would inherit that. A worker
+    # may be in another thread, and has inherited what the first process has done.
+    if threading.current_thread() is threading.main_thread():
+        signal.signal(signal.SIGINT, signal.default_int_handler)
     if os.geteuid() != 0:
         pytest.exit("only root can bring up a lab; run the end-to-end tests as root", returncode=4)
 
