@@ -1,5 +1,6 @@
 """All that lies on a machine's disk: paths, kinds, owners, modes, contents."""
 
+import contextlib
 import hashlib
 import os
 import re
@@ -32,7 +33,9 @@ def snapshot(machine):
         names[:] = [name for name in names if os.path.join(shown, name) not in LEFT_OUT]
         for name in [*names, *files]:
             path = os.path.join(folder, name)
-            found[os.path.join(shown, name)] = describe(path)
+            # On a machine that runs, files come and go.
+            with contextlib.suppress(FileNotFoundError):
+                found[os.path.join(shown, name)] = describe(path)
     return found
 
 
