@@ -42,9 +42,13 @@ def steps(machine):
 
 
 def under_way(machine):
-    """Waits until the join's own tool is at work."""
+    """Waits until the join's own tool is at work; until then the record is that of the leave before."""
+    def runs():
+        record = steps(machine)
+        return record is not None and record["finished"] is None and record["steps"]
+
     machine.wait_until(lambda: programs(machine, "vornjoin"), 10, "the join")
-    machine.wait_until(lambda: (steps(machine) or {}).get("steps"), 10, "the first step")
+    machine.wait_until(runs, 10, "the first step")
 
 
 def ends_well(machine):
