@@ -77,6 +77,11 @@ httpd_answers() {
     fi
 }
 
+# It says so once it has its address. An answer alone may be that of another lab's, which took the port a moment before.
+httpd_listens() {
+    inside "$1" grep -aqs " vorn-httpd\[$DAEMON\]: listens on " /var/log/syslog
+}
+
 port_is_free() {
     [[ -z $(ss --no-header --listening --tcp --numeric "sport = :$1") ]]
 }
@@ -144,7 +149,8 @@ run_httpd() {
         setpriv "--reuid=$HTTPD_USER" "--regid=$HTTPD_USER" --clear-groups --no-new-privs --inh-caps=-all \
         --ambient-caps=-all --bounding-set=-all -- env "HOME=$HTTPD_STATE" "$HTTPD" "${listen[@]}" "$@"
     printf '%s %s %s\n' "$DAEMON" "$network" "$url" >"$STATE/hosts/$host/httpd"
-    daemon_answers "$HTTPD_SECONDS" httpd_answers "$host" "$url" "$network" && httpd_runs "$host" && return
+    daemon_answers "$HTTPD_SECONDS" httpd_listens "$host" &&
+        daemon_answers "$HTTPD_SECONDS" httpd_answers "$host" "$url" "$network" && httpd_runs "$host" && return
     if httpd_runs "$host"; then
         end_httpd "$host" KILL >/dev/null
         die_with "$log" "vorn-httpd in $host does not answer"

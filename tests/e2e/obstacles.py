@@ -38,7 +38,8 @@ def read_only(machine, folder):
         machine.must("mount", "-o", "remount,ro,bind", folder)
         yield
     finally:
-        machine.must("umount", folder)
+        # Some daemon of the machine may have a file of it open at this moment.
+        machine.must("umount", "--lazy", folder)
 
 
 @contextlib.contextmanager

@@ -69,6 +69,11 @@ def programs(machine, *names):
     return [process for process in processes(machine) if process.name in names]
 
 
+def tasks(machine):
+    """The processes of background tasks."""
+    return [process for process in programs(machine, "vornd") if process.arguments[1:2] == ["--task"]]
+
+
 def kill(chosen):
     """Ends all processes that `chosen` answers at one moment: they are stopped first, those that they start as well."""
     stopped = {}
@@ -82,3 +87,19 @@ def kill(chosen):
     for process in stopped.values():
         process.signal(signal.SIGKILL)
     return list(stopped.values())
+
+
+@contextlib.contextmanager
+def held(chosen):
+    """The processes that `chosen` answers stand still: what the block does happens in the middle of their work."""
+    stopped = {}
+    try:
+        for _ in range(3):
+            for process in chosen():
+                if process.pid not in stopped:
+                    process.signal(signal.SIGSTOP)
+                    stopped[process.pid] = process
+        yield stopped
+    finally:
+        for process in stopped.values():
+            process.signal(signal.SIGCONT)

@@ -4,7 +4,6 @@ call ends within its deadline with the right answer, nothing is lost, and all is
 import concurrent.futures
 import contextlib
 import json
-import signal
 import statistics
 import time
 
@@ -14,7 +13,7 @@ from appliance import Appliance, Directory
 from client import DIRECTORY, DOMAIN
 from conftest import remove_computer
 from lab import password
-from processes import programs
+from processes import held, programs, tasks
 
 ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
 KNOWN = ["LAB", "OTHER"]
@@ -87,7 +86,7 @@ class Calls:
             answer = self.machine.client.call(DOMAIN, 1, "get")
             assert answer.ok
             seconds.append(answer.seconds)
-            time.sleep(0.2)
+            time.sleep(0.05)
         # Other work of this machine may hold up a single one.
         assert not seconds or statistics.median(seconds) < GET_SECONDS, seconds
         answers = {name: call.result() for name, call in self.running.items()}
@@ -183,28 +182,8 @@ def record_of(machine):
         return {"id": None, "steps": []}
 
 
-@contextlib.contextmanager
-def held(chosen):
-    """The processes that `chosen` answers stand still: what the block does happens in the middle of their work."""
-    stopped = {}
-    try:
-        for _ in range(3):
-            for process in chosen():
-                if process.pid not in stopped:
-                    process.signal(signal.SIGSTOP)
-                    stopped[process.pid] = process
-        yield stopped
-    finally:
-        for process in stopped.values():
-            process.signal(signal.SIGCONT)
-
-
 def tools(machine):
     return programs(machine, "vornjoin", "net", "wbinfo", "rpcclient")
-
-
-def tasks(machine):
-    return [process for process in programs(machine, "vornd") if process.arguments[1:2] == ["--task"]]
 
 
 def wait_for_step(machine, before, name):

@@ -17,10 +17,10 @@ def visitor(shared_door):
     return shared_door.login()
 
 
-def memory(door):
+def memory(door, kind):
     """Of the door's own, in bytes."""
     text = (door.appliance.path("/proc") / str(door.pid) / "smaps_rollup").read_text()
-    return 1024 * next(int(line.split()[1]) for line in text.splitlines() if line.startswith("Pss:"))
+    return 1024 * next(int(line.split()[1]) for line in text.splitlines() if line.startswith(f"{kind}:"))
 
 
 def header_of(door, visitor, size, name="X-Pad"):
@@ -134,12 +134,13 @@ def test_an_answer_says_what_was_wrong(shared_door, visitor):
 
 def test_nothing_has_grown(shared_door, visitor):
     """After large, broken and endless requests."""
-    before = memory(shared_door)
+    # The share in the libraries grows when another program that has them ends.
+    before = memory(shared_door, "Anonymous")
     calls = figures_of(shared_door.appliance).total("vorn_request_seconds_count", api=DOMAIN, method="get")
     for _ in range(30):
         exchange(shared_door, b"GET / HTTP/1.1\r\n" + b"X: " + b"a" * 100000)
         exchange(shared_door, post(shared_door, visitor, f"Content-Length: {BODY * 2}", body=b"a" * BODY * 2))
         exchange(shared_door, post(shared_door, visitor, "Transfer-Encoding: chunked", body=b"ffff\r\n" + b"a" * 90000))
-    assert memory(shared_door) < before + 2 * 2**20
-    assert memory(shared_door) < 16 * 2**20
+    assert memory(shared_door, "Anonymous") < before + 2 * 2**20
+    assert memory(shared_door, "Pss") < 16 * 2**20
     assert figures_of(shared_door.appliance).total("vorn_request_seconds_count", api=DOMAIN, method="get") == calls

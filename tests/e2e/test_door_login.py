@@ -97,7 +97,7 @@ def test_guessing_the_password_of_a_user(shared_door, second):
         reply = attempt(shared_door, "127.0.0.60", user, local_password("admin"))
         assert (reply.status, reply.code) == (429, 223), user
         assert 1 <= int(reply.headers["Retry-After"]) <= 30 and reply.cookies == []
-        assert reply.seconds < 1
+        assert reply.seconds < STEP, "the password was looked at"
     assert attempt(shared_door, "127.0.0.60", ADMIN, second.text).status == 200
     assert inside.session().status == 200 and inside.call(DOMAIN, 1, "get").ok
     assert shared_door.visitor().login_with(shared_door.new_link()).status == 200

@@ -165,7 +165,7 @@ def test_an_account_that_takes_all_connections_keeps_root_out_of_none(shared_doo
     holder = subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.PIPE,
                               env={**os.environ, **machine.lab.env}, start_new_session=True)
     try:
-        assert holder.stdout.readline() == b"held\n" or holder.poll() is not None
+        assert holder.stdout.readline() == b"held\n" or holder.wait(20) is not None
         for _ in range(5):
             begin = time.monotonic()
             assert machine.client.call(DOMAIN, 1, "get", deadline=10).ok

@@ -10,7 +10,7 @@ import pytest
 
 from client import DIRECTORY
 from lab import password
-from processes import kill, processes, programs
+from processes import kill, processes, programs, tasks
 
 MARKER = "/tmp/domain_updating"
 LAB_USERS = {"alice", "jörg", "norights"}
@@ -96,8 +96,14 @@ def kill_in_join(machine, victims, step, offset, domain, **more):
     return killed
 
 
+def wait_for_tasks(machine):
+    """A task tells its result first, then it takes the marker away and ends."""
+    machine.wait_until(lambda: not tasks(machine), 10, "the end of the task")
+
+
 def start_again(machine):
     """Starts the server; answers what the log says from there on."""
+    machine.wait_until(lambda: not server(machine), 10, "the end of the killed server")
     mark = len(machine.syslog())
     started = time.monotonic()
     machine.start()
@@ -276,6 +282,7 @@ def check_refresh(machine, task, alone):
         assert time.monotonic() < end, "a refresh counts as running for ever"
         time.sleep(0.05)
     assert wait_for_end(machine, answer.data["task_id"]).data == {"status": "finish"}
+    wait_for_tasks(machine)
     assert not machine.exists(MARKER)
     assert temporaries(machine) == []
     for domain in ("LAB", "OTHER"):
@@ -288,6 +295,7 @@ def test_a_killed_refresh(member):
     started = time.monotonic()
     assert member.client.refresh().data == {"status": "finish"}
     whole = time.monotonic() - started
+    wait_for_tasks(member)
     tried = Points(member)
     markers = 0
     for number in range(20):
@@ -323,6 +331,7 @@ def test_what_killed_writers_leave_blocks_no_start_and_goes(member):
     assert temporaries(member) == []
     assert LAB_USERS <= users_of(member)
     assert member.client.refresh().data == {"status": "finish"}
+    wait_for_tasks(member)
     assert not member.exists(MARKER)
 
 

@@ -52,6 +52,13 @@ def join(lab, host, tool, user, domain="LAB"):
     return lab.exec(host, "net", tool, "join", "-U", user, env={"PASSWD": password(domain, user)}, deadline=60)
 
 
+@pytest.fixture(scope="module", autouse=True)
+def fresh(lab):
+    """The appliances as they came up, whatever the tests before have left on them."""
+    for host in ("nas1", "nas2"):
+        lab.must("renew", host)
+
+
 @pytest.fixture
 def member(lab):
     """Gives a host a configuration, and takes away afterwards what a join leaves on it."""
@@ -138,7 +145,9 @@ def test_who_has_no_right_can_not_join_nt4(lab, member):
 def test_names_that_do_not_exist_are_refused_at_once(lab):
     for server, answers in (("dc1", 1), ("switch", 1)):
         result = lab.exec("nas1", "dig", f"@{lab.address(server)}", "+tries=1", "+time=2", "nosuch.example")
-        assert "ANSWER: 0" in result.out and result.seconds < 1, (answers, result)
+        # As the question itself counts, without the start of the programs.
+        took = re.search(r"Query time: (\d+) msec", result.out)
+        assert "ANSWER: 0" in result.out and int(took[1]) < 1000, (answers, result)
 
 
 def test_name_server_of_the_switch_knows_both_domains(lab):

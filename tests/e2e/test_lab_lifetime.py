@@ -15,6 +15,7 @@ from lab import COMMAND, Lab, password, run
 
 BARE = ("--no-ad", "--appliances", "nas7")  # up within a second
 SMALL = (*BARE, "--nt4")  # up within a few seconds
+HELD = []  # descriptors
 
 
 def machine():
@@ -32,7 +33,12 @@ def machine():
 
 
 def namespaces(lab):
-    """The networks of a lab's hosts."""
+    """The networks of a lab's hosts. They are held until the test ends: else the number of one that is gone could be
+    that of another lab's host a moment later."""
+    for path in lab.folder.glob("hosts/*/init"):
+        # A host that is half made or has ended has none.
+        with contextlib.suppress(FileNotFoundError, ProcessLookupError, IndexError):
+            HELD.append(os.open(f"/proc/{path.read_text().split()[0]}/ns/net", os.O_RDONLY))
     return {path.read_text().strip() for path in lab.folder.glob("hosts/*/network")}
 
 
@@ -74,6 +80,8 @@ def make(tmp_path, cache):
     yield make_one
     for lab in made:
         lab.down()
+    while HELD:
+        os.close(HELD.pop())
 
 
 def test_up_and_down_leave_no_trace(make):
@@ -100,7 +108,7 @@ def test_up_takes_the_old_one_down_first(make):
     assert not (lab.folder / "hosts" / "pdc").exists()
     for record in old:
         pid, start = record.split()
-        with contextlib.suppress(FileNotFoundError):
+        with contextlib.suppress(FileNotFoundError, ProcessLookupError):
             fields = pathlib.Path(f"/proc/{pid}/stat").read_text().rsplit(")", 1)[1].split()
             assert fields[0] == "Z" or fields[19] != start, record
 
@@ -125,7 +133,11 @@ def test_down_after_something_was_killed(make, victim):
     os.kill(int((lab.folder / victim).read_text().split()[0]), signal.SIGKILL)
     time.sleep(0.2)
     if victim.endswith("nas7/init"):
-        assert re.search(r"^nas7 .* down$", lab.must("status").out, re.M)
+        # With it end the other processes of the host first.
+        deadline = time.monotonic() + 10
+        while not re.search(r"^nas7 .* down$", (status := lab.must("status").out), re.M):
+            assert time.monotonic() < deadline, status
+            time.sleep(0.05)
         assert lab.exec("nas7", "true").err == "lab: the host nas7 is down\n"
     lab.down()
     gone(lab, networks, 0)
@@ -153,12 +165,18 @@ def test_interrupted_up_takes_itself_down(make, seconds):
     lab = make("a")
     up = subprocess.Popen([COMMAND, "up", *SMALL], env={**os.environ, **lab.env}, stdout=subprocess.PIPE,
                           stderr=subprocess.PIPE, text=True, start_new_session=True)
-    time.sleep(seconds)
+    end = time.monotonic() + seconds
+    # Earlier there is nothing to take down.
+    deadline = time.monotonic() + 20
+    while not (lab.folder / "up").exists():
+        assert time.monotonic() < deadline
+        time.sleep(0.02)
+    time.sleep(max(0, end - time.monotonic()))
     networks = namespaces(lab)
     os.killpg(up.pid, signal.SIGINT)
     _, err = up.communicate(timeout=30)
     assert up.returncode == 130 and "nothing of it is left" in err, (up.returncode, err)
-    gone(lab, networks, 0)
+    gone(lab, networks, 5)  # what waited for a host's process hears of its end a moment later
 
 
 def test_down_ends_an_up_that_is_under_way(make, tmp_path):
@@ -172,7 +190,7 @@ def test_down_ends_an_up_that_is_under_way(make, tmp_path):
     networks = namespaces(lab)
     assert lab.down().seconds < 10
     up.wait(timeout=10)
-    gone(lab, networks, 0)
+    gone(lab, networks, 5)  # the killed command's own helpers hear of it a moment later
     assert list((tmp_path / "empty-cache").glob("*.tar")) == []
 
 

@@ -281,7 +281,7 @@ class Held:
         self.children = [(other.name, other.state) for other in everyone if other.parent == process.pid]
         self.zombies = [other.status("Name") for other in everyone if other.state == "Z"]
         self.memory = sum(int(line.split()[1]) << 10 for line in process.read("smaps_rollup").decode().splitlines()
-                          if line.startswith("Pss:"))
+                          if line.startswith("Pss_Anon:"))
 
     def __repr__(self):
         return str(vars(self))

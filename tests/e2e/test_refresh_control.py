@@ -14,7 +14,7 @@ import pytest
 
 from client import DIRECTORY, DOMAIN
 from lab import COMMAND
-from processes import programs
+from processes import programs, tasks
 
 MARKER = "/tmp/domain_updating"
 PID_FILES = ("/tmp/domain_user.pid", "/tmp/domain_group.pid")
@@ -45,14 +45,11 @@ def progress(machine):
     return json.loads(text) if text else {}
 
 
-def tasks(machine):
-    return [process for process in programs(machine, "vornd") if process.arguments[1:2] == ["--task"]]
-
-
 def leaders(found):
     """The processes that none of the others has started."""
     pids = {process.pid for process in found}
-    return [process for process in found if process.parent not in pids]
+    # What has ended meanwhile has no parent any more.
+    return [process for process in found if process.parent not in pids and process.program]
 
 
 def fetchers(machine):
@@ -76,9 +73,14 @@ def wait_for_end(machine, task, seconds=60):
         time.sleep(0.1)
 
 
+def wait_for_tasks(machine):
+    """A task tells its result a moment before it ends, and counts as running until then."""
+    machine.wait_until(lambda: not tasks(machine), 10, "the end of the task")
+
+
 def assert_quiet(machine):
     """Nothing of a refresh is left: no process, no marker, no pid file, nothing half done."""
-    machine.wait_until(lambda: not tasks(machine), 10, "the end of the task")
+    wait_for_tasks(machine)
     assert not machine.exists(MARKER)
     assert not any(machine.exists(path) for path in PID_FILES)
     half = machine.must("find", "/usr/vorn/etc/private/directory", "-type", "f", "!", "-name", "user_*.db", "!",
@@ -124,6 +126,7 @@ def test_started_twice(member, lab):
         assert client.start_refresh(5).code == 2618
         assert len(leaders(tasks(member))) == 1
     assert wait_for_end(member, task).data == {"status": "finish"}
+    wait_for_tasks(member)
     assert client.refresh_status(client.start_refresh("LAB").data["task_id"]).ok
     assert client.call(DOMAIN, 1, "update_stop").ok
 
@@ -244,8 +247,8 @@ def test_ctrl_c_without_a_terminal_leaves_it_running(member, lab):
         command.join(10)
         assert ended[0].code == 4 and "goes on in the appliance" in ended[0].err, ended
         assert tasks(member)
-    # The next one follows it to its end.
-    result = member.ctl("refresh")
+        # The next one follows it to its end.
+        result = member.ctl("refresh")
     assert result.code == 0 and "following that one" in result.err, result
     assert_quiet(member)
 
@@ -267,13 +270,16 @@ class OwnFetch:
         with lab.fault("slow", only=machine.host):
             machine.must("sh", "-c", script, "start", EXIT_CODE)
             machine.wait_until(lambda: fetchers(machine), 20, "the appliance's own fetch")
-            self.stopped = programs(machine, "vornwin")
-            for process in self.stopped:
-                process.signal(signal.SIGSTOP)
+            self.stopped = {}
+            # Until there is none that another one started just before it stood still.
+            while more := [each for each in programs(machine, "vornwin") if each.pid not in self.stopped]:
+                for process in more:
+                    process.signal(signal.SIGSTOP)
+                    self.stopped[process.pid] = process
 
     def end(self):
         """Lets it go on to its end, and answers the exit code."""
-        for process in self.stopped:
+        for process in self.stopped.values():
             process.signal(signal.SIGCONT)
         self.machine.wait_until(lambda: self.machine.read(EXIT_CODE), 60, "the end of the appliance's own fetch")
         return int(self.machine.read(EXIT_CODE))

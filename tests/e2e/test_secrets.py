@@ -16,7 +16,6 @@ import time
 import pytest
 
 from client import DIRECTORY, DOMAIN
-from lab import password
 from processes import processes, programs
 
 # What the appliance hands the password to by the environment, which nobody but root can read. "timeout" is what ends
