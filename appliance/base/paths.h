@@ -43,6 +43,7 @@ inline constexpr const char kSambaPrivate[] = "/var/lib/samba/private";
 inline constexpr const char kRun[] = "/run/vorn";
 inline constexpr const char kSocket[] = "/run/vorn/vornd.sock";
 inline constexpr const char kSessions[] = "/run/vorn/sessions.json";
+inline constexpr const char kSecretsLock[] = "/run/vorn/secrets.lock";
 inline constexpr const char kJoinLock[] = "/run/vorn/join.lock";
 inline constexpr const char kJoinSteps[] = "/run/vorn/join_steps.json";
 inline constexpr const char kRefreshProgress[] = "/run/vorn/refresh.json";

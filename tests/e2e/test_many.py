@@ -1,6 +1,7 @@
 """Many at once: two appliances, and eight clients of one appliance with all methods of all APIs mixed for a minute."""
 
 import collections
+import concurrent.futures
 import json
 import random
 import threading
@@ -324,3 +325,21 @@ def test_eight_clients(member, seconds):
     assert member.smbinfo_but().items() >= FOREIGN.items()
     assert member.client.test_dc() is True
     assert member.client.refresh().data == {"status": "finish"}
+
+
+def test_it_is_a_member_for_every_library_of_the_server(member):
+    """Two modules and the server read the machine's secret, each with code of its own, at the same time."""
+    end = time.monotonic() + 5
+    asked = {"get": (DOMAIN, lambda data: data["enable_domain"]),
+             "overview": (DIRECTORY, lambda data: data["computer_account"])}
+
+    def ask(method):
+        api, is_member = asked[method]
+        answers = []
+        while time.monotonic() < end:
+            answers.append(bool(is_member(member.client.call(api, 1, method).data)))
+        return answers
+
+    with concurrent.futures.ThreadPoolExecutor(8) as pool:
+        answers = [answer for each in pool.map(ask, list(asked) * 4) for answer in each]
+    assert len(answers) > 1000 and answers.count(False) == 0, (len(answers), answers.count(False))

@@ -17,6 +17,7 @@
 #include <thread>
 
 #include "appliance/base/file.h"
+#include "appliance/base/paths.h"
 #include "appliance/base/text.h"
 
 namespace appliance {
@@ -27,10 +28,42 @@ constexpr mode_t kMode = 0600;
 constexpr std::chrono::milliseconds kLockWait{3000};
 constexpr std::chrono::milliseconds kLockPause{10};
 
-std::mutex& OneAtATime() {
-    static std::mutex mutex;
-    return mutex;
-}
+// The database library opens a file once in a process and keeps its list of open ones without a lock, so one caller at a
+// time. A mutex is not enough: the server, the platform's library and a module have this code, and so the mutex, each
+// for itself. They share a byte of a file, the one at the number of their process: other processes are not in the way.
+class OneAtATime {
+public:
+    OneAtATime() : guard_(Mutex()) {
+        // Without it, on a file system that takes no file, callers of the same library still wait for each other.
+        static_cast<void>(MakeFolder(Path(kRun), 0755));
+        file_ = FileDescriptor(open(Path(kSecretsLock).c_str(), O_RDWR | O_CREAT | O_CLOEXEC, kMode));
+        while (file_.get() >= 0 && Change(F_OFD_SETLKW, F_WRLCK) != 0 && errno == EINTR) {
+        }
+    }
+    ~OneAtATime() {
+        // Not by closing alone: a child that was forked meanwhile has the file open, too.
+        static_cast<void>(Change(F_OFD_SETLK, F_UNLCK));
+    }
+    OneAtATime(const OneAtATime&) = delete;
+    OneAtATime& operator=(const OneAtATime&) = delete;
+
+private:
+    static std::mutex& Mutex() {
+        static std::mutex mutex;
+        return mutex;
+    }
+    int Change(int command, short type) const {
+        struct flock byte {};
+        byte.l_type = type;
+        byte.l_whence = SEEK_SET;
+        byte.l_start = getpid();
+        byte.l_len = 1;
+        return fcntl(file_.get(), command, &byte);
+    }
+
+    std::lock_guard<std::mutex> guard_;
+    FileDescriptor file_;
+};
 
 struct CloseTdb {
     void operator()(tdb_context* context) const {
@@ -185,7 +218,7 @@ void Overwrite(tdb_context* tdb, const std::vector<SecretsOwner>& owners) {
 }  // namespace
 
 bool HasMachineSecret(const std::string& path, const std::string& domain) {
-    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const OneAtATime only;
     const Tdb tdb = OpenForReading(path);
     if (!tdb) {
         return false;
@@ -195,7 +228,7 @@ bool HasMachineSecret(const std::string& path, const std::string& domain) {
 }
 
 void CopySecrets(const std::string& from, const std::string& to) {
-    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const OneAtATime only;
     const Records records = ReadAll(from);
     const std::string temporary = to + ".new";
     if (unlink(temporary.c_str()) != 0 && errno != ENOENT) {
@@ -223,7 +256,7 @@ void CopySecrets(const std::string& from, const std::string& to) {
 }
 
 void ReplaceSecrets(const std::string& path, const std::string& source, const std::vector<SecretsOwner>& owners) {
-    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const OneAtATime only;
     const Records wanted = source.empty() ? Records() : ReadAll(source);
     Tdb tdb = Open(path, source.empty() ? O_RDWR : O_RDWR | O_CREAT);
     if (!tdb) {
@@ -262,7 +295,7 @@ void ReplaceSecrets(const std::string& path, const std::string& source, const st
 }
 
 bool SameMachineSecret(const std::string& first, const std::string& second, const std::string& domain) {
-    const std::lock_guard<std::mutex> guard(OneAtATime());
+    const OneAtATime only;
     std::optional<std::string> one = StoredPassword(first, domain);
     std::optional<std::string> other = StoredPassword(second, domain);
     const bool same = one == other;

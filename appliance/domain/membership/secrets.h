@@ -1,6 +1,6 @@
 // The secrets that a join leaves: the machine account's password and what belongs to it, in the file-sharing service's
 // database of secrets. Each call opens the file, does one thing and closes it; calls within a process wait for each
-// other, since the database library opens a file only once.
+// other, whichever library of it makes them, since the database library opens a file only once.
 
 #ifndef VORN_APPLIANCE_DOMAIN_MEMBERSHIP_SECRETS_H
 #define VORN_APPLIANCE_DOMAIN_MEMBERSHIP_SECRETS_H

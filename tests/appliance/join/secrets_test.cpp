@@ -10,10 +10,13 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
 #include <csignal>
 #include <system_error>
 #include <thread>
 
+#include "appliance/base/file.h"
+#include "appliance/base/paths.h"
 #include "appliance/domain/membership/kerberos.h"
 #include "tests/appliance/join/join_test.h"
 
@@ -160,6 +163,34 @@ TEST_F(SecretsTest, ThreadsWaitForEachOther) {
         thread.join();
     }
     EXPECT_EQ(good, 800);
+}
+
+// Another library of the process with this code has a mutex of its own: what both share is a lock that counts between
+// open files, also of one process.
+TEST_F(SecretsTest, LibrariesOfAProcessWaitForEachOther) {
+    PutSecrets(kLive, Both());
+    ASSERT_TRUE(appliance::HasMachineSecret(At(kLive), "LAB"));
+    const appliance::FileDescriptor other(open(At(appliance::kSecretsLock).c_str(), O_RDWR | O_CLOEXEC));
+    ASSERT_TRUE(other);
+    struct flock byte {};
+    byte.l_type = F_WRLCK;
+    byte.l_whence = SEEK_SET;
+    byte.l_start = getpid();
+    byte.l_len = 1;
+    ASSERT_EQ(fcntl(other.get(), F_OFD_SETLK, &byte), 0);
+    std::atomic<int> answer{-1};
+    std::thread thread([&] { answer = appliance::HasMachineSecret(At(kLive), "LAB") ? 1 : 0; });
+    std::this_thread::sleep_for(std::chrono::milliseconds(200));
+    EXPECT_EQ(answer, -1);
+    byte.l_type = F_UNLCK;
+    EXPECT_EQ(fcntl(other.get(), F_OFD_SETLK, &byte), 0);
+    thread.join();
+    EXPECT_EQ(answer, 1);
+    // Nobody else's process is in the way.
+    byte.l_type = F_WRLCK;
+    byte.l_start = getpid() + 1;
+    ASSERT_EQ(fcntl(other.get(), F_OFD_SETLK, &byte), 0);
+    EXPECT_TRUE(appliance::HasMachineSecret(At(kLive), "LAB"));
 }
 
 // A writer that is killed leaves the old records or the new ones.
