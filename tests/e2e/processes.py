@@ -74,6 +74,11 @@ def tasks(machine):
     return [process for process in programs(machine, "vornd") if process.arguments[1:2] == ["--task"]]
 
 
+def wait_for_tasks(machine):
+    """A task tells its result first, then it takes its marker away and ends, and counts as running until then."""
+    machine.wait_until(lambda: not tasks(machine), 20, "the end of the task")
+
+
 def kill(chosen):
     """Ends all processes that `chosen` answers at one moment: they are stopped first, those that they start as well."""
     stopped = {}

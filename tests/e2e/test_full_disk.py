@@ -6,7 +6,7 @@ import pytest
 from client import CONF, DIRECTORY, DOMAIN, EVENTS, SCHEDULE
 from lab import password
 from obstacles import Log, away, files_under, full, read_only, small_disk
-from processes import tasks
+from processes import wait_for_tasks
 
 ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
 VORND = "/usr/vorn/sbin/vornd"
@@ -74,7 +74,7 @@ def works_again(machine):
 def refresh(machine):
     """To the end of its task, which comes a moment after its status: until then it is in the way of the next one."""
     assert machine.client.refresh().ok
-    machine.wait_until(lambda: not tasks(machine), 20, "the end of the task")
+    wait_for_tasks(machine)
 
 
 def users(machine):

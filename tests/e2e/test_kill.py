@@ -10,7 +10,7 @@ import pytest
 
 from client import DIRECTORY
 from lab import password
-from processes import kill, processes, programs, tasks
+from processes import kill, processes, programs, wait_for_tasks
 
 MARKER = "/tmp/domain_updating"
 LAB_USERS = {"alice", "jörg", "norights"}
@@ -94,11 +94,6 @@ def kill_in_join(machine, victims, step, offset, domain, **more):
     killed = kill(lambda: victims(machine))
     call.wait()
     return killed
-
-
-def wait_for_tasks(machine):
-    """A task tells its result first, then it takes the marker away and ends."""
-    machine.wait_until(lambda: not tasks(machine), 10, "the end of the task")
 
 
 def start_again(machine):

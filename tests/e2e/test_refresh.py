@@ -4,6 +4,7 @@ import threading
 import time
 
 from client import DIRECTORY
+from processes import wait_for_tasks
 
 
 def progress(machine):
@@ -25,8 +26,7 @@ def test_users_and_groups_of_both_domains(member):
     assert {"zgroup"} <= names(member, "groups", "OTHER")
     for kind in ("users", "groups"):
         assert not any(name.endswith("$") for name in names(member, kind, "LAB"))
-    # The task tells its result a moment before it takes its marker away.
-    member.wait_until(lambda: member.exec("pgrep", "-f", "vornd --task").code != 0, 10, "the end of the task")
+    wait_for_tasks(member)
     assert not member.exists("/tmp/domain_updating")
     for kind in ("user", "group"):
         assert member.exists(f"/usr/vorn/etc/private/domain_{kind}_LAB.db")

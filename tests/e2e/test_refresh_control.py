@@ -14,7 +14,7 @@ import pytest
 
 from client import DIRECTORY, DOMAIN
 from lab import COMMAND
-from processes import programs, tasks
+from processes import programs, tasks, wait_for_tasks
 
 MARKER = "/tmp/domain_updating"
 PID_FILES = ("/tmp/domain_user.pid", "/tmp/domain_group.pid")
@@ -71,11 +71,6 @@ def wait_for_end(machine, task, seconds=60):
             return answer
         assert time.monotonic() < end, answer.body
         time.sleep(0.1)
-
-
-def wait_for_tasks(machine):
-    """A task tells its result a moment before it ends, and counts as running until then."""
-    machine.wait_until(lambda: not tasks(machine), 10, "the end of the task")
 
 
 def assert_quiet(machine):
