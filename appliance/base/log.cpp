@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <chrono>
 #include <cstdio>
 
 #include "appliance/base/file.h"
@@ -18,14 +19,25 @@ struct OwnLog {
 };
 OwnLog* ownLog = nullptr;
 
+constexpr std::chrono::milliseconds kPatience{1000};
+thread_local bool patient = true;
+
 }  // namespace
 
-void LogWithoutWaiting(const std::string& name, bool terminal) {
+void LogAsServer(const std::string& name, bool terminal) {
     if (ownLog != nullptr) {
         ownLog->terminal = terminal;
         return;
     }
     ownLog = new OwnLog{{name, LOG_DAEMON}, name, terminal};
+}
+
+WithoutWaitForLog::WithoutWaitForLog() {
+    patient = false;
+}
+
+WithoutWaitForLog::~WithoutWaitForLog() {
+    patient = true;
 }
 
 void Log(int priority, const std::string& text) {
@@ -45,7 +57,7 @@ void Log(int priority, const std::string& text) {
         syslog(priority, "%s", line.c_str());
         return;
     }
-    ownLog->system.Send(priority, line);
+    ownLog->system.Send(priority, line, patient ? kPatience : std::chrono::milliseconds(0));
     if (ownLog->terminal) {
         static_cast<void>(WriteAll(STDERR_FILENO, ownLog->name + "[" + std::to_string(getpid()) + "]: " + line + "\n"));
     }

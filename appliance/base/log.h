@@ -14,9 +14,19 @@ namespace appliance {
 void Log(int priority, const std::string& text);
 
 // From now on lines of Log go to the system's logger under this name as the facility LOG_DAEMON, and to standard error as
-// well when `terminal`; a line that the logger does not take at once is lost, so that nothing waits for it. Servers begin
-// with this; other programs call openlog(3). Once, before threads run.
-void LogWithoutWaiting(const std::string& name, bool terminal);
+// well when `terminal`; a line that the logger has not taken after a second is lost. Servers begin with this; other
+// programs call openlog(3). Once, before threads run.
+void LogAsServer(const std::string& name, bool terminal);
+
+// While one lives, a line that its thread writes to the log of a server is lost rather than waited for: for threads that
+// everyone else waits for.
+class WithoutWaitForLog {
+public:
+    WithoutWaitForLog();
+    ~WithoutWaitForLog();
+    WithoutWaitForLog(const WithoutWaitForLog&) = delete;
+    WithoutWaitForLog& operator=(const WithoutWaitForLog&) = delete;
+};
 
 }  // namespace appliance
 

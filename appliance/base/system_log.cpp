@@ -1,9 +1,12 @@
 #include "appliance/base/system_log.h"
 
+#include <poll.h>
 #include <sys/socket.h>
 #include <sys/un.h>
+#include <syslog.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstring>
@@ -14,6 +17,7 @@ namespace appliance {
 namespace {
 
 constexpr std::chrono::seconds kPauseWithoutLogger{1};
+constexpr std::chrono::seconds kPauseAfterWait{10};
 
 // What the system's logger expects in front of a line.
 std::string Prefix(const std::string& name, int priority) {
@@ -47,27 +51,76 @@ bool SystemLog::Connect() {
         connect(logger.get(), static_cast<const sockaddr*>(static_cast<const void*>(&address)), sizeof address) != 0) {
         return false;
     }
-    logger_ = std::move(logger);
+    logger_ = std::make_shared<const FileDescriptor>(std::move(logger));
     return true;
 }
 
-bool SystemLog::Send(int priority, std::string_view text) {
-    const std::string line = Prefix(name_, facility_ | priority) + std::string(text);
-    const std::lock_guard<std::mutex> lock(mutex_);
+std::string SystemLog::Form(int priority, std::string_view text) const {
+    return Prefix(name_, facility_ | priority) + std::string(text);
+}
+
+bool SystemLog::Lost() {
+    ++lost_;
+    return false;
+}
+
+void SystemLog::TellLost() {
+    if (lost_ != 0 &&
+        Try(Form(LOG_WARNING, "lines lost before this one: " + std::to_string(lost_))) == Outcome::Taken) {
+        lost_ = 0;
+    }
+}
+
+SystemLog::Outcome SystemLog::Try(const std::string& line) {
     // A logger that was started anew has another socket behind the same name.
     for (int attempt = 0; attempt < 2; ++attempt) {
-        if (!logger_ && !Connect()) {
-            return false;
+        if (logger_ == nullptr && !Connect()) {
+            return Outcome::Failed;
         }
-        if (send(logger_.get(), line.data(), line.size(), MSG_NOSIGNAL) >= 0) {
-            return true;
+        if (send(logger_->get(), line.data(), line.size(), MSG_NOSIGNAL) >= 0) {
+            return Outcome::Taken;
         }
-        if (errno == EAGAIN || errno == ENOBUFS || errno == EMSGSIZE) {
-            return false;
+        if (errno == EAGAIN) {
+            return Outcome::Full;
         }
-        logger_.Reset();
+        if (errno == EMSGSIZE || errno == ENOBUFS) {
+            return Outcome::Failed;
+        }
+        logger_.reset();
     }
-    return false;
+    return Outcome::Failed;
+}
+
+bool SystemLog::Send(int priority, std::string_view text, std::chrono::milliseconds patience) {
+    const std::string line = Form(priority, text);
+    const auto end = std::chrono::steady_clock::now() + patience;
+    for (;;) {
+        std::shared_ptr<const FileDescriptor> logger;
+        {
+            const std::lock_guard<std::mutex> lock(mutex_);
+            TellLost();
+            const Outcome outcome = Try(line);
+            if (outcome == Outcome::Taken) {
+                return true;
+            }
+            if (outcome == Outcome::Failed) {
+                return Lost();
+            }
+            const auto now = std::chrono::steady_clock::now();
+            if (patience.count() == 0 || now < nextWait_) {
+                return Lost();
+            }
+            if (now >= end) {
+                nextWait_ = now + kPauseAfterWait;
+                return Lost();
+            }
+            logger = logger_;
+        }
+        // Without the lock: others may be of less patience.
+        const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now());
+        pollfd room{logger->get(), POLLOUT, 0};
+        poll(&room, 1, static_cast<int>(std::max<std::chrono::milliseconds::rep>(left.count(), 0)));
+    }
 }
 
 }  // namespace appliance

@@ -48,6 +48,7 @@ Door::Door(Setup setup)
 Door::~Door() = default;
 
 bool Door::Run() {
+    const WithoutWaitForLog events;
     for (const std::unique_ptr<Listener>& listener : listeners_) {
         WaitForConnections(*listener);
     }

@@ -31,8 +31,7 @@ constexpr int kWrongCommandLine = 2;
 
 // An error of the start: to the log, and to standard error wherever that leads.
 void Complain(const std::string& line) {
-    closelog();
-    openlog("vorn-httpd", LOG_PID, LOG_DAEMON);
+    LogAsServer("vorn-httpd", false);
     Log(LOG_ERR, line);
     static_cast<void>(std::fprintf(stderr, "vorn-httpd: %s\n", line.c_str()));
 }
@@ -116,7 +115,7 @@ int Main(int count, char** arguments) {
     }
     PrepareDescriptors();
     const bool terminal = options.foreground || isatty(STDERR_FILENO) != 0;
-    openlog("vorn-httpd", LOG_PID | (terminal ? LOG_PERROR : 0), LOG_DAEMON);
+    LogAsServer("vorn-httpd", terminal);
     umask(077);
     // Passwords pass through this memory.
     prctl(PR_SET_DUMPABLE, 0);

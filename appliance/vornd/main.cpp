@@ -35,7 +35,7 @@ constexpr const char* kDescriptions = "/usr/vorn/share/methods.json";
 
 // An error of the start: to the log, and to standard error wherever that leads.
 void Complain(const std::string& line) {
-    LogWithoutWaiting("vornd", false);
+    LogAsServer("vornd", false);
     Log(LOG_ERR, line);
     static_cast<void>(std::fprintf(stderr, "vornd: %s\n", line.c_str()));
 }
@@ -166,7 +166,7 @@ int Main(int count, char** arguments) {
     const bool terminal = options.foreground || isatty(STDERR_FILENO) != 0;
     // The module calls syslog itself.
     openlog("vornd", LOG_PID | (terminal ? LOG_PERROR : 0), LOG_DAEMON);
-    LogWithoutWaiting("vornd", terminal);
+    LogAsServer("vornd", terminal);
     umask(022);
     SetRoot(options.root);
     // Passwords pass through this memory.

@@ -50,6 +50,7 @@ Server::Server(FileDescriptor listener, std::string path, const Router& router, 
       drainLimit_(loop_) {}
 
 bool Server::Run() {
+    const WithoutWaitForLog events;
     WaitForConnections();
     WaitForSignal();
     Beat();

@@ -69,6 +69,11 @@ def programs(machine, *names):
     return [process for process in processes(machine) if process.name in names]
 
 
+def loggers(machine):
+    """The system's logger."""
+    return [process for process in processes(machine) if process.arguments[:2] == ["busybox", "syslogd"]]
+
+
 def tasks(machine):
     """The processes of background tasks."""
     return [process for process in programs(machine, "vornd") if process.arguments[1:2] == ["--task"]]

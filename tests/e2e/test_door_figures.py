@@ -10,7 +10,7 @@ import pytest
 from client import DOMAIN
 from door import Door
 from lab import password
-from processes import processes, programs
+from processes import held, loggers, programs
 from prometheus import Figures
 
 
@@ -154,10 +154,8 @@ def test_the_page_is_served_while_the_server_is_away(door, calling):
 
 def test_a_logger_that_hangs_keeps_nobody_waiting(door, calling):
     machine = door.appliance
-    loggers = [process for process in processes(machine) if "syslogd" in process.arguments[1:2]]
-    assert len(loggers) == 1
-    loggers[0].signal(signal.SIGSTOP)
-    try:
+    with held(lambda: loggers(machine)) as hanging:
+        assert len(hanging) == 1
         # More lines than the system keeps for it.
         for _ in range(100):
             assert door.get("/nothing", deadline=5).status == 404
@@ -166,8 +164,6 @@ def test_a_logger_that_hangs_keeps_nobody_waiting(door, calling):
         assert visitor.logout().status == 200
         assert calling.call(DOMAIN, 1, "get", deadline=5).ok
         assert figures(door).total("vorn_httpd_log_lines_lost_total") > 0
-    finally:
-        loggers[0].signal(signal.SIGCONT)
     machine.wait_until(lambda: calling.call(DOMAIN, 1, "get").ok, 10, "calls")
 
 

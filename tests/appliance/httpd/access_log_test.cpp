@@ -72,6 +72,7 @@ TEST(AccessLogTest, ToTheSystemsLogger) {
     ASSERT_TRUE(first.bound_);
     usleep(1100000);
     log.Write(kLine);
+    EXPECT_THAT(first.Next(), ::testing::EndsWith("]: lines lost before this one: 1"));
     EXPECT_THAT(first.Next(), ::testing::MatchesRegex("<30>[A-Z][a-z]{2} [ 0-9]{2} [0-9:]{8} vorn-httpd\\[[0-9]+\\]: "
                                                       "10.0.0.5 GET /webapi 200 153 bytes 12 ms"));
 }
