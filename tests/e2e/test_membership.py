@@ -6,8 +6,9 @@ import time
 
 import pytest
 
-from client import DIRECTORY
+from client import DIRECTORY, DOMAIN
 from lab import password
+from obstacles import replaced
 
 ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
 NT_ADMINISTRATOR = ("Administrator", password("NT4DOM", "Administrator"))
@@ -90,6 +91,31 @@ def test_the_last_test_is_told_until_the_membership_changes(member, lab):
     assert last_test() is None and not member.exists("/var/lib/vorn/last_test.json")
     assert member.client.test_dc() is False
     assert last_test() is None
+
+
+# Samba's tool, but that its attempts to test the membership end as the words of /tmp/attempts tell, one after the other.
+ODD_TESTS = """cat >"$1" <<'SCRIPT'
+#!/bin/bash
+if [[ " $* " == *" testjoin "* ]]; then
+    read -r next others </tmp/attempts
+    echo "$others" >/tmp/attempts
+    case $next in
+        fails) echo 'Join to domain is not valid: No logon servers are currently available' >&2; exit 255 ;;
+        hangs) exec sleep 60 ;;
+    esac
+fi
+exec -a net /usr/bin/net.kept "$@"
+SCRIPT
+"""
+
+
+def test_an_attempt_of_the_test_that_fails_or_hangs_is_not_the_last(member):
+    with replaced(member, "/usr/bin/net", ODD_TESTS):
+        for attempts, works in [("hangs", True), ("fails hangs", True), ("fails fails fails", False)]:
+            member.must("sh", "-c", 'echo "$1" >/tmp/attempts', "write", attempts)
+            answer = member.client.call(DOMAIN, 1, "test_dc")
+            assert answer.data == {"test_join_success": works} and answer.seconds < 13, (attempts, answer)
+            assert member.must("cat", "/tmp/attempts").out.strip() == "", f"{attempts}: an attempt was not made"
 
 
 def test_a_leave_names_the_computer_account_beforehand(member):
