@@ -129,24 +129,28 @@ private:
     std::string text_;
 };
 
-// Reads both outputs until the child has ended or the deadline has passed.
-void Follow(ChildProcess& child, Output& output, Output& errors, Clock::time_point end, CommandResult& result) {
+// Reads both outputs until the child has ended, the deadline has passed or `cancel` can be read.
+void Follow(ChildProcess& child, Output& output, Output& errors, Clock::time_point end, int cancel,
+            CommandResult& result) {
     constexpr std::size_t kOneTurn = std::size_t{1} << 18;
+    bool cancelled = false;
     for (;;) {
         if (const std::optional<ChildEnd> ended = child.Look()) {
             SetEnd(*ended, result);
             break;
         }
         const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - Clock::now());
-        if (left.count() <= 0) {
+        if (left.count() <= 0 || cancelled) {
             child.Kill();
             result.end = CommandResult::End::TimedOut;
             result.code = 0;
             break;
         }
         const auto most = child.handle() >= 0 ? std::chrono::milliseconds(std::chrono::hours(1)) : kPauseWithoutPidfd;
-        std::array<pollfd, 3> waiting = {
-            {{output.descriptor(), POLLIN, 0}, {errors.descriptor(), POLLIN, 0}, {child.handle(), POLLIN, 0}}};
+        std::array<pollfd, 4> waiting = {{{output.descriptor(), POLLIN, 0},
+                                          {errors.descriptor(), POLLIN, 0},
+                                          {child.handle(), POLLIN, 0},
+                                          {cancel, POLLIN, 0}}};
         poll(waiting.data(), waiting.size(), static_cast<int>(std::min(left, most).count()));
         if (waiting[0].revents != 0) {
             output.Read(kOneTurn);
@@ -154,6 +158,7 @@ void Follow(ChildProcess& child, Output& output, Output& errors, Clock::time_poi
         if (waiting[1].revents != 0) {
             errors.Read(kOneTurn);
         }
+        cancelled = waiting[3].revents != 0;
     }
     // What it left in the pipes. A child of its own may still hold them open: its words are not waited for.
     output.Read(kMostAfterEnd);
@@ -203,7 +208,7 @@ CommandResult Start(const Command& command, CommandChild& child, Clock::time_poi
     ChildProcess running(pid, group ? ChildProcess::Reach::Group : ChildProcess::Reach::Process);
     Output out(std::move(output.read), command.outputLimit);
     Output err(std::move(errors.read), command.outputLimit);
-    Follow(running, out, err, end, result);
+    Follow(running, out, err, end, command.cancel, result);
     // Nothing more can come: the child has ended, and its exec, if it came to that, has closed the other end.
     if (read(status.read.get(), &failure, sizeof(failure)) == static_cast<ssize_t>(sizeof(failure))) {
         result = NotStarted(failure);

@@ -23,6 +23,9 @@ struct Command {
     // The whole of its time, in milliseconds. When it passes, the program is ended with all that it started.
     std::chrono::milliseconds deadline{10000};
 
+    // When this descriptor can be read, the program is ended as at its deadline; -1: none. Not owned.
+    int cancel = -1;
+
     // Added to the environment, which otherwise holds PATH, HOME=/ and LC_ALL=C only. Secrets go to `secretEnvironment`.
     std::vector<std::pair<std::string, std::string>> environment = {};
     std::vector<std::pair<std::string, Secret>> secretEnvironment = {};

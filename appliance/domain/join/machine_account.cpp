@@ -1,9 +1,12 @@
 #include "appliance/domain/join/machine_account.h"
 
 #include <algorithm>
+#include <mutex>
+#include <optional>
 #include <vector>
 
 #include "appliance/base/text.h"
+#include "appliance/domain/join/attempts.h"
 #include "appliance/domain/join/time_budget.h"
 #include "appliance/domain/join/tool_output.h"
 #include "appliance/domain/membership/discovery.h"
@@ -15,9 +18,8 @@ namespace {
 
 constexpr std::chrono::milliseconds kFindWait{2000};
 constexpr std::chrono::milliseconds kLeastAttempt{1000};  // less time is not worth asking in
-constexpr std::chrono::milliseconds kLastAttempt{3000};   // kept for it, when that leaves the one before long enough
-constexpr std::chrono::milliseconds kLongEnough{6000};
 constexpr int kAttempts = 3;
+constexpr std::chrono::milliseconds kPatience{6000};
 
 std::string PrimaryController(const Membership& membership, const std::string& configuration,
                               std::chrono::milliseconds time) {
@@ -30,12 +32,7 @@ std::string PrimaryController(const Membership& membership, const std::string& c
     return found.empty() ? "" : found.front().address;
 }
 
-SecretState Ask(SambaCall& call, std::chrono::milliseconds time, std::string* words) {
-    call.deadline = time;
-    const CommandResult result = RunNet(call);
-    if (words != nullptr) {
-        *words = LastWords(result);
-    }
+SecretState StateOf(const CommandResult& result) {
     if (ProvesMembership(result)) {
         return SecretState::Works;
     }
@@ -52,13 +49,6 @@ SecretState Ask(SambaCall& call, std::chrono::milliseconds time, std::string* wo
         }
     }
     return SecretState::Unknown;
-}
-
-// A controller that did not answer is left alone for a minute by all of Samba's programs, whoever asked it; and one whose
-// return falls into an attempt can make it wait ten seconds for a lost answer of the name server. So neither the first
-// attempt nor the second takes all the time: the next one begins without any memory, and needs a fraction of a second.
-std::chrono::milliseconds TimeOfAttempt(std::chrono::milliseconds left) {
-    return left >= kLongEnough + kLastAttempt ? left - kLastAttempt : left;
 }
 
 }  // namespace
@@ -113,20 +103,42 @@ SecretState TestSecret(const Membership& membership, const std::string& configur
             call.arguments.push_back("--server=" + server);
         }
     }
-    if (!configuration.empty()) {
-        return Ask(call, budget.Left(deadline), words);
-    }
-    SecretState state = Ask(call, TimeOfAttempt(budget.Left(deadline)), words);
-    for (int attempt = 1; attempt < kAttempts && state == SecretState::Unknown; ++attempt) {
-        const std::chrono::milliseconds left = budget.Left(deadline);
-        const ScratchFolder memory;
-        if (left < kLeastAttempt || memory.path().empty()) {
-            break;
+    // A controller that did not answer is left alone for a minute by all of Samba's programs, whoever asked it, and one
+    // whose return falls into an attempt can make it wait ten seconds for a lost answer of the name server. The further
+    // attempts know nothing of what was before.
+    AttemptLimits limits;
+    limits.attempts = configuration.empty() ? kAttempts : 1;
+    limits.time = budget.Left(deadline);
+    limits.least = kLeastAttempt;
+    // At a controller of the NT4 style each attempt sets up the account's secure channel anew: never two at once.
+    limits.pause = membership.kind == DomainKind::ActiveDirectory ? kPatience : deadline;
+    std::mutex mutex;
+    SecretState state = SecretState::Unknown;
+    const auto attempt = [&](int number, std::chrono::milliseconds time, int cancel) {
+        std::optional<ScratchFolder> memory;
+        SambaCall own = call;
+        own.deadline = time;
+        own.cancel = cancel;
+        if (number > 0) {
+            memory.emplace();
+            if (memory->path().empty()) {
+                return false;
+            }
+            own.arguments.push_back("--option=lock directory=" + memory->path());
         }
-        SambaCall fresh = call;
-        fresh.arguments.push_back("--option=lock directory=" + memory.path());
-        state = Ask(fresh, TimeOfAttempt(left), words);
-    }
+        const CommandResult result = RunNet(own);
+        const SecretState found = StateOf(result);
+        const std::lock_guard<std::mutex> lock(mutex);
+        if (state != SecretState::Unknown) {
+            return true;
+        }
+        state = found;
+        if (words != nullptr) {
+            *words = LastWords(result);
+        }
+        return state != SecretState::Unknown;
+    };
+    Ask(attempt, limits);
     return state;
 }
 

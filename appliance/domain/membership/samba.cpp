@@ -15,6 +15,7 @@ Command SambaCommand(const std::string& program, const SambaCall& call) {
                          "--configfile=" + (call.configuration.empty() ? Path(kSmbConf) : call.configuration)};
     command.arguments.insert(command.arguments.end(), call.arguments.begin(), call.arguments.end());
     command.deadline = call.deadline;
+    command.cancel = call.cancel;
     command.ownGroup = call.ownGroup;
     command.endsWithCaller = call.endsWithCaller;
     if (!call.kerberosConfiguration.empty()) {

@@ -28,6 +28,7 @@ struct SambaCall {
     bool ownGroup = true;                       // see Command::ownGroup
     bool endsWithCaller = true;                 // see Command::endsWithCaller
     std::string kerberosConfiguration = {};     // empty: the machine's
+    int cancel = -1;                            // see Command::cancel
 };
 
 // True when the account's name may be handed to the tools: an account name (IsAccountName) without "%", at which they

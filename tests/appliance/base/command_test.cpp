@@ -9,6 +9,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <array>
 #include <atomic>
 #include <cerrno>
 #include <csignal>
@@ -218,6 +219,29 @@ TEST_F(CommandTest, DeadlineEndsGrandchildrenToo) {
         ASSERT_GT(pid, 0);
         EXPECT_TRUE(Eventually([&] { return !IsAlive(pid); })) << name;
     }
+}
+
+TEST_F(CommandTest, WhatIsCalledOffEndsAsAtItsDeadline) {
+    std::array<int, 2> ends{};
+    ASSERT_EQ(pipe2(ends.data(), O_CLOEXEC), 0);
+    const appliance::FileDescriptor reading(ends[0]);
+    appliance::FileDescriptor writing(ends[1]);
+    Command command = Shell("sleep 60 & echo $! > " + folder / "child" + "; wait");
+    command.deadline = seconds(60);
+    command.cancel = reading.get();
+    std::thread caller([&writing, this] {
+        EXPECT_TRUE(Eventually([this] { return NumberIn(folder / "child") > 0; }));
+        writing.Reset();
+    });
+    const CommandResult result = appliance::Run(command);
+    caller.join();
+    EXPECT_EQ(result.end, End::TimedOut);
+    EXPECT_LT(result.took, seconds(30));
+    EXPECT_TRUE(Eventually([this] { return !IsAlive(NumberIn(folder / "child")); }));
+
+    command = Shell("echo done");
+    command.cancel = -1;
+    EXPECT_EQ(appliance::Run(command).output, "done\n");
 }
 
 TEST_F(CommandTest, DeadlineEndsWhatIgnoresSignals) {

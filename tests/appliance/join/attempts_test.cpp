@@ -1,0 +1,122 @@
+#include "appliance/domain/join/attempts.h"
+
+#include <gtest/gtest.h>
+#include <poll.h>
+
+#include <atomic>
+#include <chrono>
+#include <stdexcept>
+#include <thread>
+
+namespace {
+
+using appliance::Ask;
+using appliance::AttemptLimits;
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+using Clock = std::chrono::steady_clock;
+
+AttemptLimits Limits(milliseconds time, milliseconds pause) {
+    AttemptLimits limits;
+    limits.time = time;
+    limits.pause = pause;
+    limits.least = milliseconds(10);
+    return limits;
+}
+
+// Until its time has passed. True: nobody waits for it any more.
+bool Hang(milliseconds time, int cancel) {
+    pollfd waiting{cancel, POLLIN, 0};
+    return poll(&waiting, 1, static_cast<int>(time.count())) == 1;
+}
+
+TEST(AttemptsTest, AnAnswerAtOnceNeedsOneAttempt) {
+    std::atomic<int> begun{0};
+    EXPECT_TRUE(Ask([&](int, milliseconds, int) { return ++begun == 1; }, Limits(seconds(60), seconds(30))));
+    EXPECT_EQ(begun, 1);
+}
+
+TEST(AttemptsTest, AFailureIsFollowedByTheNextAttemptAtOnce) {
+    std::atomic<int> begun{0};
+    const auto begin = Clock::now();
+    EXPECT_TRUE(
+        Ask([&](int number, milliseconds, int) { return ++begun, number == 2; }, Limits(seconds(60), seconds(30))));
+    EXPECT_EQ(begun, 3);
+    EXPECT_LT(Clock::now() - begin, seconds(20));
+}
+
+TEST(AttemptsTest, WhatHangsIsOvertakenAndCalledOff) {
+    std::atomic<int> calledOff{0};
+    const auto begin = Clock::now();
+    EXPECT_TRUE(Ask(
+        [&](int number, milliseconds time, int cancel) {
+            if (number < 2) {
+                calledOff += Hang(time, cancel) ? 1 : 0;
+                return false;
+            }
+            return true;
+        },
+        Limits(seconds(60), milliseconds(100))));
+    EXPECT_EQ(calledOff, 2);
+    EXPECT_GE(Clock::now() - begin, milliseconds(200));
+    EXPECT_LT(Clock::now() - begin, seconds(30));
+}
+
+TEST(AttemptsTest, TheFirstMayStillAnswerWhileOthersRun) {
+    std::atomic<int> calledOff{0};
+    EXPECT_TRUE(Ask(
+        [&](int number, milliseconds time, int cancel) {
+            if (number == 0) {
+                std::this_thread::sleep_for(milliseconds(400));
+                return true;
+            }
+            calledOff += Hang(time, cancel) ? 1 : 0;
+            return false;
+        },
+        Limits(seconds(60), milliseconds(100))));
+    EXPECT_EQ(calledOff, 2);
+}
+
+TEST(AttemptsTest, WithoutAnAnswerItEndsWhenTheTimeIsOver) {
+    std::atomic<int> begun{0};
+    const auto begin = Clock::now();
+    EXPECT_FALSE(Ask(
+        [&](int, milliseconds time, int cancel) {
+            ++begun;
+            EXPECT_LE(time, milliseconds(500));
+            return Hang(time, cancel) && false;
+        },
+        Limits(milliseconds(500), milliseconds(100))));
+    EXPECT_EQ(begun, 3);
+    EXPECT_GE(Clock::now() - begin, milliseconds(490));
+    EXPECT_LT(Clock::now() - begin, seconds(10));
+}
+
+TEST(AttemptsTest, TooLittleTimeIsNotWorthAnAttempt) {
+    std::atomic<int> begun{0};
+    AttemptLimits limits = Limits(milliseconds(500), milliseconds(300));
+    limits.least = milliseconds(400);
+    EXPECT_FALSE(Ask([&](int, milliseconds time, int cancel) { return ++begun, Hang(time, cancel) && false; }, limits));
+    EXPECT_EQ(begun, 1);
+}
+
+TEST(AttemptsTest, OneAttemptStaysAlone) {
+    std::atomic<int> begun{0};
+    AttemptLimits limits = Limits(milliseconds(300), milliseconds(50));
+    limits.attempts = 1;
+    EXPECT_FALSE(Ask([&](int, milliseconds time, int cancel) { return ++begun, Hang(time, cancel) && false; }, limits));
+    EXPECT_EQ(begun, 1);
+}
+
+TEST(AttemptsTest, AnExceptionIsNoAnswer) {
+    EXPECT_TRUE(Ask(
+        [](int number, milliseconds, int) {
+            if (number == 0) {
+                throw std::runtime_error("odd");
+            }
+            return true;
+        },
+        Limits(seconds(60), seconds(30))));
+}
+
+}  // namespace
