@@ -2,7 +2,6 @@
 
 #include <sys/eventfd.h>
 
-#include <cerrno>
 #include <condition_variable>
 #include <exception>
 #include <mutex>
@@ -20,11 +19,8 @@ namespace {
 
 class Attempts {
 public:
-    explicit Attempts(const Attempt& attempt) : attempt_(attempt), cancel_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
-        if (!cancel_) {
-            throw std::system_error(errno, std::generic_category());
-        }
-    }
+    // Where no descriptor is left, attempts can't be called off and take their time.
+    explicit Attempts(const Attempt& attempt) : attempt_(attempt), cancel_(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
     ~Attempts() {
         static_cast<void>(eventfd_write(cancel_.get(), 1));
         for (std::thread& thread : threads_) {
@@ -34,10 +30,17 @@ public:
     Attempts(const Attempts&) = delete;
     Attempts& operator=(const Attempts&) = delete;
 
-    void Begin(std::chrono::milliseconds time) {
+    // False, with a line in the log: the machine has no thread left.
+    bool Begin(std::chrono::milliseconds time) {
         const std::lock_guard<std::mutex> lock(mutex_);
-        threads_.emplace_back([this, number = static_cast<int>(threads_.size()), time] { Make(number, time); });
+        try {
+            threads_.emplace_back([this, number = static_cast<int>(threads_.size()), time] { Make(number, time); });
+        } catch (const std::system_error& error) {
+            Log(LOG_WARNING, std::string("an attempt can't begin: ") + error.what());
+            return false;
+        }
         ++running_;
+        return true;
     }
 
     // Until the answer is there, none runs or the time has passed. True: the answer is there.
@@ -75,21 +78,13 @@ private:
 bool Ask(const Attempt& attempt, const AttemptLimits& limits) {
     const TimeBudget budget(limits.time);
     Attempts attempts(attempt);
-    attempts.Begin(limits.time);
-    for (int next = 1; next < limits.attempts; ++next) {
+    bool begun = attempts.Begin(limits.time);
+    for (int next = 1; begun && next < limits.attempts; ++next) {
         if (attempts.Wait(budget.Left(limits.pause))) {
             return true;
         }
         const std::chrono::milliseconds left = budget.Left(limits.time);
-        if (left < limits.least) {
-            break;
-        }
-        try {
-            attempts.Begin(left);
-        } catch (const std::system_error& error) {
-            Log(LOG_WARNING, std::string("no further attempt can begin: ") + error.what());
-            break;
-        }
+        begun = left >= limits.least && attempts.Begin(left);
     }
     // Each attempt keeps to its time; this is for one that does not.
     return attempts.Wait(budget.Left(limits.time) + limits.least);

@@ -21,7 +21,7 @@ struct AttemptLimits {
 
 // Begins attempts one after the other, the next one when all before it have ended without the answer or the pause has
 // passed, until one brings the answer or the time is over. Returns when the last has ended. Each gets all the time that
-// is left. What an attempt throws counts as no answer. Throws std::system_error when not even the first can begin.
+// is left. What an attempt throws counts as no answer, and so does one that can't begin for want of a thread.
 bool Ask(const Attempt& attempt, const AttemptLimits& limits);
 
 }  // namespace appliance

@@ -2,6 +2,9 @@
 
 #include <gtest/gtest.h>
 #include <poll.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <atomic>
 #include <chrono>
@@ -106,6 +109,27 @@ TEST(AttemptsTest, OneAttemptStaysAlone) {
     limits.attempts = 1;
     EXPECT_FALSE(Ask([&](int, milliseconds time, int cancel) { return ++begun, Hang(time, cancel) && false; }, limits));
     EXPECT_EQ(begun, 1);
+}
+
+TEST(AttemptsTest, WithoutAThreadThereIsNoAnswer) {
+    const pid_t child = fork();
+    ASSERT_GE(child, 0);
+    if (child == 0) {
+        constexpr rlimit kNone{1, 1};  // root has no such limit
+        constexpr uid_t kNobody = 65534;
+        if ((geteuid() == 0 && setuid(kNobody) != 0) || setrlimit(RLIMIT_NPROC, &kNone) != 0) {
+            _exit(2);
+        }
+        try {
+            _exit(Ask([](int, milliseconds, int) { return true; }, Limits(seconds(3), seconds(1))) ? 1 : 0);
+        } catch (...) {
+            _exit(3);
+        }
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    ASSERT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0);
 }
 
 TEST(AttemptsTest, AnExceptionIsNoAnswer) {
