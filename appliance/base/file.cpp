@@ -13,7 +13,10 @@
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
+#include <string>
 #include <vector>
+
+#include "appliance/base/log.h"
 
 namespace appliance {
 
@@ -307,6 +310,28 @@ std::error_code MakeFolder(const std::string& path, mode_t mode) {
         return Errno();
     }
     return {};
+}
+
+bool ClearForeign(const std::string& path) {
+    struct stat found = {};
+    struct stat folder = {};
+    if (lstat(path.c_str(), &found) != 0) {
+        return errno == ENOENT;  // another program of the appliance has removed it
+    }
+    if (found.st_uid == geteuid() || stat(FolderOf(path).c_str(), &folder) != 0 || (folder.st_mode & S_ISVTX) == 0) {
+        return false;
+    }
+    if (S_ISDIR(found.st_mode)) {
+        std::string aside = path + ".foreign-XXXXXX";
+        if (mkdtemp(aside.data()) == nullptr || rename(path.c_str(), aside.c_str()) != 0) {
+            rmdir(aside.c_str());
+            return false;
+        }
+    } else if (unlink(path.c_str()) != 0) {
+        return false;
+    }
+    Log(LOG_WARNING, path + " was in the way, of user " + std::to_string(found.st_uid) + ", and has been removed");
+    return true;
 }
 
 int RemoveStaleTemporaries(const std::string& folder) {

@@ -90,6 +90,11 @@ std::error_code RemoveFile(const std::string& path);
 // Makes a folder with its parents. The last one gets `mode` also when it is there already.
 std::error_code MakeFolder(const std::string& path, mode_t mode);
 
+// In a folder where everybody may make files (a sticky one), what another user has put under the caller's name must not
+// stand in its way: it goes, with a line in the log; a folder, which may hold something, under another name. True when it
+// is worth to try again: it is gone.
+bool ClearForeign(const std::string& path);
+
 // Removes temporary files (".<name>.vorn-XXXXXX", as MakeTemporary makes them) that a killed writer left in `folder` and that
 // nobody holds the lock of. Returns how many. One whose maker has closed its descriptor and means to go on with the name
 // goes as well, so this is for a start, before such makers begin.

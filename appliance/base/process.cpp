@@ -137,7 +137,9 @@ bool WritePidFile(const std::string& path) {
     if (!file) {
         return false;
     }
-    if (WriteOwnPid(file.get()) && rename(temporary.c_str(), path.c_str()) == 0) {
+    const auto putInPlace = [&] { return rename(temporary.c_str(), path.c_str()) == 0; };
+    // A file of another user's is replaced like any other, a folder is not.
+    if (WriteOwnPid(file.get()) && (putInPlace() || (ClearForeign(path) && putInPlace()))) {
         return true;
     }
     unlink(temporary.c_str());

@@ -23,9 +23,34 @@ using appliance::SettingsLock;
 namespace {
 
 constexpr mode_t kNewMode = 0644;
+constexpr int kTouchAttempts = 3;
 
 std::error_code Errno() {
     return {errno, std::generic_category()};
+}
+
+// Opens the regular file of the appliance's own at `path`, made when it is missing. `code` says why it can't be.
+FileDescriptor OpenOwn(const std::string& path, appliance::ErrorCode& code) {
+    constexpr int kFlags = O_WRONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY;
+    for (int attempt = 0;; ++attempt) {
+        FileDescriptor file(open(path.c_str(), kFlags | O_CREAT | O_EXCL, kNewMode));
+        // Without O_CREAT, which the kernel may refuse for another user's file before it can be looked at.
+        if (!file && errno == EEXIST) {
+            file.Reset(open(path.c_str(), kFlags));
+        }
+        struct stat found = {};
+        const bool opened = file && fstat(file.get(), &found) == 0;
+        if (opened && S_ISREG(found.st_mode) && found.st_uid == geteuid()) {
+            return file;
+        }
+        const std::string reason =
+            opened ? "there is something else than a file of the appliance's own" : Errno().message();
+        if (attempt == kTouchAttempts || !appliance::ClearForeign(path)) {
+            Log(LOG_ERR, path + ": " + reason);
+            code = opened ? appliance::ErrorCode::BadData : appliance::ErrorCode::FileWrite;
+            return {};
+        }
+    }
 }
 
 // Gives the new file the attributes of the one that it replaces, writes it to the disk, and puts it in its place.
@@ -92,16 +117,10 @@ int VLIBCFileTouch(const char* path) {
         if (path == nullptr) {
             return VORN_FAIL(BadArgument);
         }
-        const FileDescriptor file(
-            open(path, O_WRONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY, kNewMode));
-        struct stat found = {};
-        if (!file || fstat(file.get(), &found) != 0) {
-            Log(LOG_ERR, std::string(path) + ": " + Errno().message());
-            return VORN_FAIL(FileWrite);
-        }
-        if (!S_ISREG(found.st_mode) || found.st_uid != geteuid()) {
-            Log(LOG_ERR, std::string(path) + ": there is something else than a file of the appliance's own");
-            return VORN_FAIL(BadData);
+        appliance::ErrorCode code = appliance::ErrorCode::Internal;
+        const FileDescriptor file = OpenOwn(path, code);
+        if (!file) {
+            return code == appliance::ErrorCode::BadData ? VORN_FAIL(BadData) : VORN_FAIL(FileWrite);
         }
         return futimens(file.get(), nullptr) == 0 ? 0 : VORN_FAIL(FileWrite);
     })

@@ -6,16 +6,20 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <csignal>
 #include <filesystem>
 #include <thread>
+#include <vector>
 
 #include "appliance/base/command.h"
 #include "tests/appliance/base/temporary_folder.h"
+#include "tests/appliance/base/traced_child.h"
 
 using appliance::FileDescriptor;
 using appliance::ReadFile;
@@ -262,6 +266,17 @@ TEST_F(FileTest, Folders) {
     EXPECT_EQ(appliance::MakeFolder(path, 0700), std::errc::not_a_directory);
     EXPECT_EQ(appliance::MakeFolder(path + "/below", 0700), std::errc::not_a_directory);
     EXPECT_TRUE(appliance::MakeFolder("", 0700));
+}
+
+// A power cut is told from a killed writer by what has reached the disk: the content before the name, and the name before
+// the answer.
+TEST_F(FileTest, TheDiskHasTheContentBeforeTheName) {
+    Put(path, "old");
+    const auto replace = [&] { return !ReplaceFile(path, "new"); };
+    std::vector<long> calls = appliance_test::CallsOf(replace, replace);
+    const auto isOther = [](long call) { return call != SYS_write && call != SYS_fsync && call != SYS_rename; };
+    calls.erase(std::remove_if(calls.begin(), calls.end(), isOther), calls.end());
+    EXPECT_THAT(calls, ElementsAre(SYS_write, SYS_fsync, SYS_rename, SYS_fsync));
 }
 
 TEST_F(FileTest, FolderAndName) {

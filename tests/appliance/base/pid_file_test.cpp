@@ -14,6 +14,7 @@
 #include <filesystem>
 #include <thread>
 
+#include "appliance/base/file.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/process.h"
 #include "tests/appliance/base/temporary_folder.h"
@@ -209,6 +210,24 @@ TEST_F(PidFileTest, WrittenOverWhatIsNoneAnyMore) {
     EXPECT_FALSE(WritePidFile(path));
     EXPECT_THAT(folder.Names(), testing::ElementsAre("file.pid", "foreign", "run"));
     EXPECT_FALSE(WritePidFile(folder / "none/file.pid"));
+}
+
+// In /tmp everybody may make a folder of this name.
+TEST_F(PidFileTest, WrittenWhereAnotherUserHasMadeAFolder) {
+    const auto put = [this] {
+        std::filesystem::create_directories(path + "/full");
+        ASSERT_EQ(chown(path.c_str(), 1, 1), 0);
+    };
+    put();
+    EXPECT_FALSE(WritePidFile(path));
+    ASSERT_EQ(chmod(appliance::FolderOf(path).c_str(), 01777), 0);
+    EXPECT_TRUE(WritePidFile(path));
+    EXPECT_EQ(ReadPidFile(path), getpid());
+    std::size_t aside = 0;
+    for (const std::string& name : folder.Names()) {
+        aside += name.find("file.pid.foreign-") == 0 ? 1U : 0U;
+    }
+    EXPECT_EQ(aside, 1U);
 }
 
 TEST_F(PidFileTest, OneOfManyWriters) {
