@@ -1,4 +1,5 @@
-// Where the appliance keeps its things. Every fixed path of the appliance's own programs stands here and nowhere else.
+// Where the appliance keeps its things: the fixed paths that several parts of it need. One that a single part needs
+// stands beside the code that does. docs/appliance.md lists all of them, which a test holds against the sources.
 
 #ifndef VORN_APPLIANCE_BASE_PATHS_H
 #define VORN_APPLIANCE_BASE_PATHS_H

@@ -7,7 +7,9 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <memory>
+#include <system_error>
 
 #include "appliance/base/conf_file.h"
 #include "appliance/base/paths.h"
@@ -21,18 +23,17 @@ namespace {
 
 constexpr std::size_t kMostAddresses = 32;
 
-std::vector<std::string> WantedInterfaces() {
+std::error_code WantedInterfaces(std::vector<std::string>& names) {
     ConfFile options;
-    std::vector<std::string> names;
-    if (ConfFile::Load(Path(kSmbInfo), options)) {
-        return names;
+    if (const std::error_code error = ConfFile::Load(Path(kSmbInfo), options)) {
+        return error;
     }
     for (const std::string& name : Split(options.Get("global", "register nic").value_or(""), ",")) {
         if (!Trim(name).empty()) {
             names.push_back(Trim(name));
         }
     }
-    return names;
+    return {};
 }
 
 // The address as text; empty when it is none that other machines could use.
@@ -58,12 +59,14 @@ std::string UsableAddress(const sockaddr& address) {
 
 }  // namespace
 
-std::vector<std::string> AddressesToRegister() {
-    const std::vector<std::string> wanted = WantedInterfaces();
-    std::vector<std::string> addresses;
+std::string AddressesToRegister(std::vector<std::string>& addresses) {
+    std::vector<std::string> wanted;
+    if (const std::error_code error = WantedInterfaces(wanted)) {
+        return Path(kSmbInfo) + ": " + error.message();
+    }
     ifaddrs* first = nullptr;
     if (getifaddrs(&first) != 0) {
-        return addresses;
+        return "the interfaces can't be listed: " + std::generic_category().message(errno);
     }
     const std::unique_ptr<ifaddrs, void (*)(ifaddrs*)> owner(first, freeifaddrs);
     for (const ifaddrs* place = first; place != nullptr; place = place->ifa_next) {
@@ -78,18 +81,22 @@ std::vector<std::string> AddressesToRegister() {
             addresses.push_back(address);
         }
     }
-    return addresses;
+    return addresses.empty() ? "no interface has an address to register" : "";
 }
 
 std::string RegisteredName(const Membership& membership) {
     return Lower(membership.machine) + "." + Lower(membership.realm);
 }
 
-std::string RegisterInDns(const Membership& membership, const std::vector<std::string>& addresses,
+namespace {
+
+// As the machine account, which may change what it registered itself; then, as records of a former account are another's,
+// with the credentials, when there are some.
+std::string ChangeRecords(const char* verb, const Membership& membership, const std::vector<std::string>& addresses,
                           const Credentials& credentials, std::chrono::milliseconds deadline) {
     const TimeBudget budget(deadline);
     SambaCall call;
-    call.arguments = {"ads", "dns", "register", "--machine-pass", "--", RegisteredName(membership)};
+    call.arguments = {"ads", "dns", verb, "--machine-pass", "--", RegisteredName(membership)};
     call.arguments.insert(call.arguments.end(), addresses.begin(), addresses.end());
     call.deadline = budget.Left(deadline);
     CommandResult result = RunNet(call);
@@ -102,12 +109,16 @@ std::string RegisterInDns(const Membership& membership, const std::vector<std::s
     return result.Succeeded() ? "" : LastWords(result);
 }
 
-std::string UnregisterInDns(const Membership& membership, std::chrono::milliseconds deadline) {
-    SambaCall call;
-    call.arguments = {"ads", "dns", "unregister", "--machine-pass", "--", RegisteredName(membership)};
-    call.deadline = deadline;
-    const CommandResult result = RunNet(call);
-    return result.Succeeded() ? "" : LastWords(result);
+}  // namespace
+
+std::string RegisterInDns(const Membership& membership, const std::vector<std::string>& addresses,
+                          const Credentials& credentials, std::chrono::milliseconds deadline) {
+    return ChangeRecords("register", membership, addresses, credentials, deadline);
+}
+
+std::string UnregisterInDns(const Membership& membership, const Credentials& credentials,
+                            std::chrono::milliseconds deadline) {
+    return ChangeRecords("unregister", membership, {}, credentials, deadline);
 }
 
 }  // namespace appliance

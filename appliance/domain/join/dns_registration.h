@@ -13,8 +13,9 @@
 namespace appliance {
 
 // The addresses to register: those of the interfaces that "register nic" of smbinfo.conf names, or of all; without
-// loopback and link-local ones.
-std::vector<std::string> AddressesToRegister();
+// loopback and link-local ones. Empty when there are some, else why there are none: also when smbinfo.conf can't be read,
+// since nobody knows then which are meant.
+std::string AddressesToRegister(std::vector<std::string>& addresses);
 
 // "nas1.example.com", the name to register.
 std::string RegisteredName(const Membership& membership);
@@ -24,8 +25,10 @@ std::string RegisteredName(const Membership& membership);
 std::string RegisterInDns(const Membership& membership, const std::vector<std::string>& addresses,
                           const Credentials& credentials, std::chrono::milliseconds deadline);
 
-// Removes the name's records with the machine account. Empty on success, else the reason.
-std::string UnregisterInDns(const Membership& membership, std::chrono::milliseconds deadline);
+// Removes the name's records in the same way; without credentials (an empty user) as the machine account alone. Empty on
+// success, else the reason.
+std::string UnregisterInDns(const Membership& membership, const Credentials& credentials,
+                            std::chrono::milliseconds deadline);
 
 }  // namespace appliance
 

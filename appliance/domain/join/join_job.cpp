@@ -35,8 +35,9 @@ constexpr milliseconds kWinbindWait{5000};
 constexpr milliseconds kTrustWait{4000};
 constexpr milliseconds kDnsWait{4000};
 constexpr milliseconds kRecoveryWait{4000};
-constexpr milliseconds kDeleteWait{3000};
-constexpr milliseconds kBackWinbindWait{2500};
+constexpr milliseconds kDeleteWait{2500};
+constexpr milliseconds kBackWinbindWait{2000};
+static_assert(2 * kBackWinbindWait + kDeleteWait < kBackTime, "the launcher would end the way back before its end");
 constexpr long kMostClockDifference = 300;  // seconds; Kerberos refuses more
 
 std::string ServerName(const Controller& controller) {
@@ -126,12 +127,13 @@ void JoinJob::LookForComputerAccount(const std::string& probe) {
     const std::string account = journal_.before.Account();
     steps_.Begin("computer account", ServerName(target_.controller));
     if (target_.kind == DomainKind::ActiveDirectory) {
-        accountBefore_ = LookUpAccount(account, target_.realm, kerberosConfiguration_, budget_.Left(kTicketWait));
+        journal_.accountBefore =
+            LookUpAccount(account, target_.realm, kerberosConfiguration_, budget_.Left(kTicketWait));
     } else {
-        accountBefore_ = LookUpAccountByRpc(account, target_.controller.address, probe, request_.credentials,
-                                            budget_.Left(kLookupWait));
+        journal_.accountBefore = LookUpAccountByRpc(account, target_.controller.address, probe, request_.credentials,
+                                                    budget_.Left(kLookupWait));
     }
-    switch (accountBefore_) {
+    switch (journal_.accountBefore) {
         case AccountState::Absent:
             return steps_.Ok(account + " does not exist yet");
         case AccountState::Present:
@@ -158,7 +160,6 @@ void JoinJob::Prepare() {
     journal_.after.realm = target_.realm;
     journal_.after.passwordServer = request_.controller;
     journal_.after.hasSecret = true;
-    journal_.accountExisted = accountBefore_ != AccountState::Absent;
     journal_.controller = target_.controller.address;
     PrepareJoin(journal_, target_.controller.address);
     journalled_ = true;
@@ -251,10 +252,11 @@ void JoinJob::ConfirmTrustOfNewOne() {
 void JoinJob::FinishUp() {
     if (target_.kind == DomainKind::ActiveDirectory) {
         steps_.Begin("dns", ServerName(target_.controller));
-        const std::vector<std::string> addresses = AddressesToRegister();
-        const std::string error =
-            addresses.empty() ? "no interface has an address to register"
-                              : RegisterInDns(journal_.after, addresses, request_.credentials, budget_.Left(kDnsWait));
+        std::vector<std::string> addresses;
+        std::string error = AddressesToRegister(addresses);
+        if (error.empty()) {
+            error = RegisterInDns(journal_.after, addresses, request_.credentials, budget_.Left(kDnsWait));
+        }
         if (error.empty()) {
             steps_.Ok(RegisteredName(journal_.after) + ": " + std::to_string(addresses.size()) + " addresses");
         } else {
@@ -362,18 +364,19 @@ void JoinJob::StartOldWinbind() {
 
 void JoinJob::RemoveCreatedAccount() {
     const std::string account = journal_.after.Account();
-    if (accountBefore_ == AccountState::Present) {
+    if (journal_.accountBefore == AccountState::Present) {
         return;
     }
-    if (accountBefore_ == AccountState::Unknown) {
+    if (journal_.accountBefore == AccountState::Unknown) {
         steps_.Leftover("the computer account " + account + " may have been created in " + target_.domain);
         return;
     }
     const std::string error = DeleteMachineAccount(account, target_.controller.address, journal::StagedConf(),
                                                    request_.credentials, kDeleteWait);
     if (!error.empty()) {
+        const bool known = journal_.phase != Phase::Joining;
         steps_.Leftover("the computer account " + account + " of " + target_.domain +
-                        " was created and could not be removed: " + error);
+                        (known ? " was created" : " may have been created") + " and could not be removed: " + error);
     }
 }
 

@@ -48,7 +48,6 @@ private:
     JoinTarget target_;
     Journal journal_;
     std::string kerberosConfiguration_;
-    AccountState accountBefore_ = AccountState::Unknown;
     bool journalled_ = false;
     std::string undone_;  // what putting back came to, for the list of steps
 };

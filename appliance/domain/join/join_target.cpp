@@ -101,6 +101,7 @@ private:
         steps_.Server(Named(controller));
         if (!ports.kerberos.empty()) {
             if (IsPrimary(addresses)) {
+                RequireNoRealm(status::kKdc);
                 steps_.Ok("a primary domain controller of an NT4-style domain");
                 return Nt4Target(controller);
             }
@@ -113,10 +114,6 @@ private:
         const ControllerInfo info = LookUp(controller.address);
         if (info.realm.empty()) {
             Fail(status::kNoWorkgroup, lookupWords_);
-        }
-        const std::string wanted = WantedRealm();
-        if (!wanted.empty() && !EqualIgnoringCase(wanted, info.realm)) {
-            Fail(status::kKdc, "it is a controller of " + info.realm + ", not of " + wanted);
         }
         return Accept(info, controller, true);
     }
@@ -158,12 +155,13 @@ private:
             nt4Name_ = name;
             const Controller& controller = found.front();
             steps_.Server(controller.address);
-            steps_.Ok("NetBIOS names a primary domain controller of " + name);
             const ControllerInfo info = LookUp(controller.address);
-            if (!info.realm.empty()) {
-                return AtOneOf({{info.name, controller.address}});
+            const bool nt4 = info.realm.empty();
+            if (nt4) {
+                RequireNoRealm(status::kNoController);
             }
-            return Nt4Target(controller);
+            steps_.Ok("NetBIOS names a primary domain controller of " + name);
+            return nt4 ? Nt4Target(controller) : AtOneOf({{info.name, controller.address}});
         }
         Fail(status::kNoController, "no service record in DNS and no primary domain controller by NetBIOS");
     }
@@ -225,6 +223,13 @@ private:
     }
 
     JoinTarget Accept(const ControllerInfo& info, const Controller& controller, bool pinned) {
+        // What DNS or NetBIOS named need not be what was asked for: the controller's own word counts.
+        for (const std::string& realm : {request_.realm, IsDotted(request_.domain) ? request_.domain : ""}) {
+            if (!realm.empty() && !EqualIgnoringCase(realm, info.realm)) {
+                Fail(pinned ? status::kKdc : status::kNoController,
+                     "it is a controller of " + info.realm + ", not of " + realm);
+            }
+        }
         const std::string domain = Upper(info.domain);
         if (!request_.netbiosName.empty() && !EqualIgnoringCase(request_.netbiosName, domain)) {
             Fail(status::kWorkgroup, "the domain's NetBIOS name is " + domain + ", not " + request_.netbiosName);
@@ -240,6 +245,14 @@ private:
         target.controller = {info.name.empty() ? controller.name : info.name, controller.address};
         target.pinned = pinned;
         return target;
+    }
+
+    // A domain of the NT4 style has no DNS name, so it can't be the one that is asked for by such a name.
+    void RequireNoRealm(const std::string& message) {
+        if (!WantedRealm().empty()) {
+            Fail(message, "it is the primary domain controller of " + nt4Name_ + ", an NT4-style domain, not of " +
+                              WantedRealm());
+        }
     }
 
     JoinTarget Nt4Target(const Controller& controller) {

@@ -28,6 +28,7 @@ constexpr std::size_t kLargestJournal = 1 << 20;
 
 constexpr std::array kPhases = {"prepared", "joining",   "joined",       "swapping",
                                 "swapped",  "confirmed", "putting back", "leaving"};
+constexpr std::array kAccounts = {"absent", "present", "unknown"};
 constexpr std::array kKinds = {"workgroup", "ads", "domain"};
 
 std::string JournalFile() {
@@ -123,7 +124,7 @@ void WriteJournal(const Journal& journal) {
     object["phase"] = kPhases[static_cast<std::size_t>(journal.phase)];
     object["before"] = FormatMembership(journal.before);
     object["after"] = FormatMembership(journal.after);
-    object["account existed"] = journal.accountExisted;
+    object["account before"] = kAccounts[static_cast<std::size_t>(journal.accountBefore)];
     object["keep new secret"] = journal.keepNewSecret;
     object["reset options"] = journal.resetOptions;
     object["controller"] = journal.controller;
@@ -149,8 +150,8 @@ std::optional<Journal> ReadJournal() {
     try {
         if (reader->parse(text.data(), text.data() + text.size(), &object, nullptr) && object.isObject() &&
             FromName(kPhases, object["phase"].asString(), journal.phase) &&
+            FromName(kAccounts, object.get("account before", "unknown").asString(), journal.accountBefore) &&
             ParseMembership(object["before"], journal.before) && ParseMembership(object["after"], journal.after)) {
-            journal.accountExisted = object["account existed"].asBool();
             journal.keepNewSecret = object["keep new secret"].asBool();
             journal.resetOptions = object["reset options"].asBool();
             journal.controller = object["controller"].asString();

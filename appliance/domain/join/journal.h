@@ -8,6 +8,7 @@
 #include <string>
 
 #include "appliance/base/conf_file.h"
+#include "appliance/domain/join/account_check.h"
 #include "appliance/domain/membership/membership.h"
 
 namespace appliance {
@@ -24,19 +25,28 @@ struct Journal {
         Leaving,      // the local traces of a membership are being removed
     };
     Phase phase = Phase::Prepared;
-    Membership before;            // as it was; `hasSecret` says whether it was complete
-    Membership after;             // as it will be
-    bool accountExisted = true;   // on the controller, before the join; also when that is not known
-    bool keepNewSecret = false;   // while putting back: the old secret is dead
-    bool resetOptions = false;    // while leaving: reset the advanced options, too
-    std::string controller = {};  // the address asked
+    Membership before;                                   // as it was; `hasSecret` says whether it was complete
+    Membership after;                                    // as it will be
+    AccountState accountBefore = AccountState::Unknown;  // on the controller, before the join
+    bool keepNewSecret = false;                          // while putting back: the old secret is dead
+    bool resetOptions = false;                           // while leaving: reset the advanced options, too
+    std::string controller = {};                         // the address asked
 
     // The machine account that is joined is the one that the appliance has already, so that joining kills the old
     // secret.
     bool SameAccount() const {
-        return before.Joined() && EqualDomain() && before.machine == after.machine;
+        return EqualName() && accountBefore != AccountState::Absent;
+    }
+    // The appliance's own account was gone from the controller, so that its old secret was dead before the join.
+    bool AccountWasLost() const {
+        return EqualName() && accountBefore == AccountState::Absent;
     }
     bool EqualDomain() const;
+
+private:
+    bool EqualName() const {
+        return before.Joined() && EqualDomain() && before.machine == after.machine;
+    }
 };
 
 // Files of the journal's folder.

@@ -8,6 +8,7 @@
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/text.h"
+#include "appliance/domain/join/journal.h"
 #include "appliance/domain/join/recovery.h"
 #include "appliance/domain/join/time_budget.h"
 
@@ -47,6 +48,10 @@ JobResult RunJoinTool(const JoinRequest& request) {
     const CommandResult ended = Run(command);
     JobResult result;
     if (ended.end == CommandResult::End::Exited && ParseJobResult(ended.output, result)) {
+        if (!result.success && ReadJournal()) {
+            // No controller could tell which secret works: found out as soon as one answers.
+            RecoverInBackground(Wanted::OldOrNone);
+        }
         return result;
     }
     Log(LOG_ERR, Path(kVornjoin) + " " + ended.Describe() + (ended.errors.empty() ? "" : ": " + Trim(ended.errors)));

@@ -16,6 +16,7 @@
 #include "appliance/domain/join/tool_output.h"
 #include "appliance/domain/join/winbind.h"
 #include "appliance/domain/membership/kerberos.h"
+#include "appliance/domain/membership/secrets.h"
 #include "appliance/platform/system/services.h"
 
 namespace appliance {
@@ -122,7 +123,8 @@ void LeaveJob::DeleteAccount() {
     CheckCredentials(controller);
     if (membership_.kind == DomainKind::ActiveDirectory) {
         // Before the account goes: afterwards nobody but an administrator could remove its records.
-        if (const std::string error = UnregisterInDns(membership_, budget_.Left(kDnsWait)); !error.empty()) {
+        if (const std::string error = UnregisterInDns(membership_, request_.credentials, budget_.Left(kDnsWait));
+            !error.empty()) {
             steps_.Leftover("the addresses of " + RegisteredName(membership_) + " stay in DNS: " + error);
         }
     }
@@ -130,8 +132,7 @@ void LeaveJob::DeleteAccount() {
                                                    budget_.Left(kDeleteWait));
     if (!error.empty()) {
         if (membership_.kind == DomainKind::ActiveDirectory) {
-            static_cast<void>(
-                RegisterInDns(membership_, AddressesToRegister(), request_.credentials, budget_.Left(kDnsWait)));
+            RegisterAgain();
         }
         const bool forbidden = Contains(error, "Access") || Contains(error, "ACCESS_DENIED");
         Fail(forbidden ? status::kNoRight : "The computer account could not be removed: " + error, error);
@@ -140,12 +141,26 @@ void LeaveJob::DeleteAccount() {
     steps_.Ok(membership_.Account());
 }
 
+// The account stays, and so does the membership.
+void LeaveJob::RegisterAgain() {
+    std::vector<std::string> addresses;
+    std::string error = AddressesToRegister(addresses);
+    if (error.empty()) {
+        error = RegisterInDns(membership_, addresses, request_.credentials, budget_.Left(kDnsWait));
+    }
+    if (!error.empty()) {
+        steps_.Leftover("the addresses of " + RegisteredName(membership_) + " are no longer in DNS: " + error);
+    }
+}
+
 void LeaveJob::Unregister() {
     if (membership_.kind != DomainKind::ActiveDirectory || deleted_) {
         return;
     }
     steps_.Begin("dns");
-    if (const std::string error = UnregisterInDns(membership_, budget_.Left(kDnsWait)); !error.empty()) {
+    // There are no credentials; and Samba's tool would make a damaged database of secrets anew.
+    KeepDamagedSecrets(Path(kSecrets));
+    if (const std::string error = UnregisterInDns(membership_, {}, budget_.Left(kDnsWait)); !error.empty()) {
         accountGone_ = Contains(error, "Client not found");
         steps_.Failed(error);
         steps_.Leftover("the addresses of " + RegisteredName(membership_) + " stay in DNS: " + error);

@@ -24,6 +24,7 @@ private:
     Controller FindController();
     void CheckCredentials(const Controller& controller);
     void DeleteAccount();
+    void RegisterAgain();
     void Unregister();
     void Clear();
     [[noreturn]] void Fail(const std::string& message, const std::string& detail = {});

@@ -2,10 +2,16 @@
 
 #include <sys/stat.h>
 
+#include <cerrno>
+#include <optional>
+
+#include "appliance/base/conf_file.h"
 #include "appliance/base/file.h"
+#include "appliance/base/kept_copy.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
-#include "appliance/base/text.h"
+#include "appliance/base/settings.h"
+#include "appliance/domain/membership/membership.h"
 #include "appliance/platform/system/dns_servers.h"
 #include "appliance/platform/system/resolv_conf.h"
 
@@ -14,12 +20,9 @@ namespace appliance {
 namespace {
 
 constexpr char kFormerTrust[] = "/usr/vorn/etc/private/trustdomain.kept";
-constexpr std::size_t kLargest = 1 << 20;
-
-std::string Read(const std::string& path) {
-    std::string text;
-    return ReadFile(Path(path), text, kLargest) ? "" : text;
-}
+constexpr char kSection[] = "global";
+constexpr char kTrust[] = "trustdomain";
+constexpr mode_t kSettingsMode = 0644;
 
 void Remove(const std::string& path) {
     if (const std::error_code error = RemoveFile(Path(path)); error && error != std::errc::no_such_file_or_directory) {
@@ -41,31 +44,88 @@ std::string Joined(const std::vector<std::string>& texts) {
     return joined.empty() ? "none" : joined;
 }
 
-// The kept copy begins with a line of its own; then come the bytes of the file as it was, as many as that line says,
-// and the bytes that it was changed to.
+// Nothing when nothing is left changed.
 std::string DnsChange() {
-    const std::string kept = Read(kResolvCopy);
-    const std::string current = Read(kResolvConf);
-    const std::size_t end = kept.find('\n');
-    if (end == std::string::npos || current.empty() || kept.size() < end + 1 + current.size() ||
-        kept.compare(kept.size() - current.size(), current.size(), current) != 0) {
+    const std::optional<KeptCopy> kept = ReadKeptCopy(Path(kResolvCopy));
+    Content current;
+    if (!kept || ReadContent(Path(kResolvConf), current) || current != kept->after) {
         return "";
     }
-    const std::string before = kept.substr(end + 1, kept.size() - current.size() - end - 1);
-    return "the DNS servers are still " + Joined(Servers(current)) + "; before the join: " + Joined(Servers(before));
+    return "the DNS servers are still " + Joined(Servers(*current)) +
+           "; before the join: " + Joined(Servers(kept->before.value_or("")));
+}
+
+bool TrustIn(const Content& settings) {
+    return TrustedDomainsEnabled(ConfFile(settings.value_or("")));
+}
+
+const char* Word(bool enabled) {
+    return enabled ? "yes" : "no";
+}
+
+std::string TrustChange() {
+    const std::optional<KeptCopy> kept = ReadKeptCopy(Path(kFormerTrust));
+    if (!kept || TrustIn(kept->before) == TrustedDomainsEnabled()) {
+        return "";
+    }
+    return std::string("the trusted-domain setting is still changed; before the join: ") + kTrust + "=" +
+           Word(TrustIn(kept->before));
+}
+
+// What the settings are to be: as they were, or the key alone where somebody else has changed them meanwhile.
+std::error_code PutBackTrust(const KeptCopy& kept, const Content& current) {
+    const std::string path = Path(kSettings);
+    if (current == kept.after) {
+        return kept.before ? ReplaceFile(path, *kept.before, kSettingsMode) : RemoveFile(path);
+    }
+    ConfFile settings(current.value_or(""));
+    if (const auto value = ConfFile(kept.before.value_or("")).Get(kSection, kTrust); !value) {
+        settings.Remove(kSection, kTrust);
+    } else if (!settings.Set(kSection, kTrust, *value)) {
+        return std::make_error_code(std::errc::invalid_argument);
+    }
+    return settings.text() == current ? std::error_code() : settings.Save(path, kSettingsMode);
+}
+
+// The copy first: a setting that was changed must be one that the next start can name.
+std::error_code SetTrust(const Content& current, bool enabled) {
+    ConfFile settings(current.value_or(""));
+    if (!settings.Set(kSection, kTrust, Word(enabled))) {
+        return std::make_error_code(std::errc::invalid_argument);
+    }
+    if (const std::error_code error = WriteKeptCopy(Path(kFormerTrust), {current, settings.text()})) {
+        Log(LOG_ERR, Path(kFormerTrust) + ": " + error.message());
+        return error;
+    }
+    const std::error_code error = settings.Save(Path(kSettings), kSettingsMode);
+    if (error) {
+        Remove(kFormerTrust);
+    }
+    return error;
 }
 
 }  // namespace
 
-void NoteTrustChange(const std::string& from, const std::string& to) {
-    const std::string kept = Trim(Read(kFormerTrust));
-    if (kept.empty() && from != to) {
-        if (const std::error_code error = ReplaceFile(Path(kFormerTrust), from + "\n")) {
-            Log(LOG_WARNING, Path(kFormerTrust) + ": " + error.message());
-        }
-    } else if (!kept.empty() && kept == to) {
-        Remove(kFormerTrust);
+std::error_code ChangeTrustSetting(bool enabled) {
+    const std::optional<SettingsLock> lock = SettingsLock::Take();
+    if (!lock) {
+        return errno == EAGAIN ? std::make_error_code(std::errc::timed_out)
+                               : std::error_code(errno, std::generic_category());
     }
+    Content current;
+    if (const std::error_code error = ReadContent(Path(kSettings), current)) {
+        return error;
+    }
+    const std::optional<KeptCopy> kept = ReadKeptCopy(Path(kFormerTrust));
+    if (kept && TrustIn(kept->before) == enabled) {
+        // The copy goes last: while the setting is changed, the next start can name it.
+        const std::error_code error = PutBackTrust(*kept, current);
+        if (!error) {
+            Remove(kFormerTrust);
+        }
+        return error;
+    }
+    return TrustIn(current) == enabled ? std::error_code() : SetTrust(current, enabled);
 }
 
 void KeepProvisionalChanges() {
@@ -82,8 +142,9 @@ std::vector<std::string> TakeProvisionalChanges(std::time_t before) {
         Remove(kResolvCopy);
     }
     if (IsOlder(kFormerTrust, before)) {
-        changes.push_back("the trusted-domain setting is still changed; before the join: trustdomain=" +
-                          Trim(Read(kFormerTrust)));
+        if (const std::string trust = TrustChange(); !trust.empty()) {
+            changes.push_back(trust);
+        }
         Remove(kFormerTrust);
     }
     return changes;

@@ -6,13 +6,15 @@
 
 #include <ctime>
 #include <string>
+#include <system_error>
 #include <vector>
 
 namespace appliance {
 
-// The trusted-domain setting changes from one text to another. The first value of a chain of changes is kept; a change
-// back to it ends the chain.
-void NoteTrustChange(const std::string& from, const std::string& to);
+// Changes the trusted-domain setting under the settings' lock. The first of a chain of changes keeps the file as it was;
+// a change back to that value ends the chain and brings the file back to the byte, unless somebody else has written it
+// meanwhile: then only this key goes back. ETIMEDOUT when another holds the lock for more than 5 s.
+std::error_code ChangeTrustSetting(bool enabled);
 
 // A join has succeeded: what was changed ahead of it stays.
 void KeepProvisionalChanges();

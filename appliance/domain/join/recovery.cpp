@@ -89,28 +89,19 @@ private:
     }
 
     // The appliance's own account was joined again. Until its new password was stored here, the controller may have
-    // either: only a test tells.
+    // either: only a test tells. Also where none was stored: the tool may have been killed between the two.
     void SettleSecret(const Journal& journal) {
-        const std::string domain = journal.after.domain;
-        if (SameMachineSecret(Path(kSecrets), journal::StagedSecrets(), domain)) {
-            // Killed, or with the whole machine gone, the tool may have changed the password without storing it.
-            const bool dead = TestSecret(journal.before, "", "", budget_.Left(kTestWait)) == SecretState::Refused;
-            if (dead) {
-                return GiveUpSecrets(journal);
-            }
-            Note(Unfinished(journal) + "the membership is the old one");
-            return;
-        }
-        if (journal.phase != Phase::Joined) {
+        const bool stored = !SameMachineSecret(Path(kSecrets), journal::StagedSecrets(), journal.after.domain);
+        if (!stored || journal.phase != Phase::Joined) {
             const SecretState old = TestSecret(journal.before, "", "", budget_.Left(kTestWait));
             if (old == SecretState::Works) {
                 Note(Unfinished(journal) + "the membership is the old one");
                 return;
             }
             const SecretState staged =
-                old == SecretState::Refused
+                stored && old == SecretState::Refused
                     ? TestSecret(journal.after, journal::StagedConf(), journal.controller, budget_.Left(kTestWait))
-                    : SecretState::Unknown;
+                    : old;
             if (staged == SecretState::Unknown) {
                 Note(Unfinished(journal) +
                      "no controller answers, so that it can't be found out yet whether the "
@@ -143,9 +134,11 @@ private:
         Note("the appliance is in its workgroup " + std::string(kWorkgroup));
     }
 
-    // Another account than the appliance's own was joined, so the old membership, if any, is untouched.
+    // Another account than the appliance's own was joined, or that one was gone: the old membership, if any, is as it
+    // was.
     void Forget(const Journal& journal) {
-        if (wanted_ == Wanted::Either && !journal.before.DomainMode() &&
+        const bool nothingToKeep = !journal.before.DomainMode() || journal.AccountWasLost();
+        if (wanted_ == Wanted::Either && nothingToKeep &&
             HasMachineSecret(journal::StagedSecrets(), journal.after.domain) &&
             TestSecret(journal.after, journal::StagedConf(), journal.controller, budget_.Left(kTestWait)) ==
                 SecretState::Works) {
@@ -158,7 +151,12 @@ private:
             // It may have been stopped already.
             Complain(StartWinbind(budget_.Left(kWinbindWait)));
         }
-        if (!journal.accountExisted) {
+        NameAccount(journal);
+    }
+
+    // Nobody has the credentials any more to remove an account that the join may have created.
+    void NameAccount(const Journal& journal) {
+        if (journal.accountBefore != AccountState::Present) {
             Note("the computer account " + journal.after.Account() + " may have been created in " +
                  journal.after.domain + " and stays there");
         }
@@ -194,9 +192,8 @@ private:
         }
         RestartWinbind(journal.before);
         Note(Unfinished(journal) + "it had failed and was put back");
-        if (!journal.accountExisted) {
-            Note("the computer account " + journal.after.Account() + " may have been created in " +
-                 journal.after.domain + " and stays there");
+        if (!journal.SameAccount()) {
+            NameAccount(journal);
         }
     }
 

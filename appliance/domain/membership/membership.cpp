@@ -64,9 +64,10 @@ Membership MembershipOf(const ConfFile& conf) {
 
 bool TrustedDomainsEnabled() {
     ConfFile settings;
-    if (ConfFile::Load(Path(kSettings), settings)) {
-        return true;
-    }
+    return ConfFile::Load(Path(kSettings), settings) || TrustedDomainsEnabled(settings);
+}
+
+bool TrustedDomainsEnabled(const ConfFile& settings) {
     return !EqualIgnoringCase(settings.Get("global", "trustdomain").value_or("yes"), "no");
 }
 

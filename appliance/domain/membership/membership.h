@@ -50,6 +50,7 @@ inline constexpr char kSmbConfLock[] = "/run/vorn/smb.conf.lock";
 
 // The trusted-domain setting: key "trustdomain" of the settings file, "yes" (also when absent) or "no".
 bool TrustedDomainsEnabled();
+bool TrustedDomainsEnabled(const ConfFile& settings);
 
 }  // namespace appliance
 

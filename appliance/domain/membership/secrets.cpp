@@ -17,6 +17,7 @@
 #include <thread>
 
 #include "appliance/base/file.h"
+#include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/text.h"
 
@@ -25,6 +26,7 @@ namespace appliance {
 namespace {
 
 constexpr mode_t kMode = 0600;
+constexpr char kDamaged[] = ".damaged";
 constexpr std::chrono::milliseconds kLockWait{3000};
 constexpr std::chrono::milliseconds kLockPause{10};
 
@@ -135,14 +137,30 @@ int CollectRecord(tdb_context* /*tdb*/, TDB_DATA key, TDB_DATA value, void* reco
     return 0;
 }
 
+// The disk gives the file's bytes, and they are no database: nobody can make anything of them any more.
+bool IsDamaged(const std::string& path, tdb_context* tdb) {
+    std::string bytes;
+    const bool readable = !ReadFile(path, bytes);
+    explicit_bzero(bytes.data(), bytes.size());
+    return readable && (tdb == nullptr || tdb_check(tdb, nullptr, nullptr) != 0);
+}
+
+// Did opening fail for what the file holds, and not for a want of rights, room or descriptors?
+bool IsNoDatabase(const std::string& path, int error) {
+    return error == EIO && IsDamaged(path, nullptr);
+}
+
 Records ReadAll(const std::string& path) {
     Records records;
     Tdb tdb = Open(path, O_RDWR);
     if (!tdb) {
-        if (errno == ENOENT) {
-            return records;
+        const int error = errno;
+        if (IsNoDatabase(path, error)) {
+            Log(LOG_WARNING, path + ": damaged, so that it holds no secrets");
+        } else if (error != ENOENT) {
+            Throw(path, error);
         }
-        Throw(path, errno);
+        return records;
     }
     if (!WithinWait([&] { return tdb_lockall_read_nonblock(tdb.get()) == 0; })) {
         Throw(path, EAGAIN);
@@ -150,9 +168,22 @@ Records ReadAll(const std::string& path) {
     const int count = tdb_traverse_read(tdb.get(), CollectRecord, &records);
     tdb_unlockall_read(tdb.get());
     if (count < 0) {
-        Throw(path, EIO);
+        if (!IsDamaged(path, tdb.get())) {
+            Throw(path, EIO);
+        }
+        Log(LOG_WARNING, path + ": damaged, so that it holds no secrets");
+        records.clear();
     }
     return records;
+}
+
+// A damaged database, which counts as missing from here on.
+void SetAside(const std::string& path) {
+    const std::string aside = path + kDamaged;
+    if (const std::error_code error = RenameFile(path, aside)) {
+        throw std::system_error(error, path);
+    }
+    Log(LOG_WARNING, path + ": damaged; kept as " + aside);
 }
 
 bool EndsWith(std::string_view text, const std::string& ending) {
@@ -242,11 +273,11 @@ void CopySecrets(const std::string& from, const std::string& to) {
         for (const auto& [name, bytes] : records) {
             std::string key = name;
             if (tdb_store(tdb.get(), KeyOf(key), bytes->data(), TDB_REPLACE) != 0) {
-                Throw(temporary, ENOSPC);
+                Throw(temporary, errno);
             }
         }
         if (tdb_transaction_commit(tdb.get()) != 0) {
-            Throw(temporary, ENOSPC);
+            Throw(temporary, errno);
         }
     }
     if (const std::error_code error = RenameFile(temporary, to)) {
@@ -255,42 +286,77 @@ void CopySecrets(const std::string& from, const std::string& to) {
     }
 }
 
-void ReplaceSecrets(const std::string& path, const std::string& source, const std::vector<SecretsOwner>& owners) {
-    const OneAtATime only;
-    const Records wanted = source.empty() ? Records() : ReadAll(source);
-    Tdb tdb = Open(path, source.empty() ? O_RDWR : O_RDWR | O_CREAT);
-    if (!tdb) {
-        if (source.empty() && errno == ENOENT) {
-            return;
-        }
-        Throw(path, errno);
-    }
-    if (source.empty()) {
-        Overwrite(tdb.get(), owners);
-    }
-    if (!WithinWait([&] { return tdb_transaction_start_nonblock(tdb.get()) == 0; })) {
-        Throw(path, EAGAIN);
+namespace {
+
+// Changes the records in one transaction. False, with errno, when the database takes it or gives them not.
+bool ChangeRecords(tdb_context* tdb, const Records& wanted, const std::vector<SecretsOwner>& owners) {
+    errno = 0;
+    if (!WithinWait([&] { return tdb_transaction_start_nonblock(tdb) == 0; })) {
+        errno = EAGAIN;
+        return false;
     }
     Records present;
-    bool good = tdb_traverse_read(tdb.get(), CollectRecord, &present) >= 0;
+    bool good = tdb_traverse_read(tdb, CollectRecord, &present) >= 0;
     for (auto record = present.begin(); good && record != present.end(); ++record) {
         std::string key = record->first;
         if (OwnedByAny(owners, key)) {
-            good = tdb_delete(tdb.get(), KeyOf(key)) == 0;
+            good = tdb_delete(tdb, KeyOf(key)) == 0;
         }
     }
     for (auto record = wanted.begin(); good && record != wanted.end(); ++record) {
         std::string key = record->first;
         if (OwnedByAny(owners, key)) {
-            good = tdb_store(tdb.get(), KeyOf(key), record->second->data(), TDB_REPLACE) == 0;
+            good = tdb_store(tdb, KeyOf(key), record->second->data(), TDB_REPLACE) == 0;
         }
     }
-    if (!good) {
-        tdb_transaction_cancel(tdb.get());
-        Throw(path, EIO);
+    if (good) {
+        return tdb_transaction_commit(tdb) == 0;
     }
-    if (tdb_transaction_commit(tdb.get()) != 0) {
-        Throw(path, EIO);
+    const int error = errno;
+    tdb_transaction_cancel(tdb);
+    errno = error;
+    return false;
+}
+
+}  // namespace
+
+void ReplaceSecrets(const std::string& path, const std::string& source, const std::vector<SecretsOwner>& owners) {
+    const OneAtATime only;
+    const bool removes = source.empty();
+    const Records wanted = removes ? Records() : ReadAll(source);
+    for (bool again = false;; again = true) {
+        // With O_CREAT, the library would make a damaged one anew.
+        Tdb tdb = Open(path, O_RDWR);
+        if (!tdb && errno == ENOENT) {
+            if (removes) {
+                return;
+            }
+            tdb = Open(path, O_RDWR | O_CREAT);
+        }
+        if (tdb && removes) {
+            Overwrite(tdb.get(), owners);
+        }
+        if (tdb && ChangeRecords(tdb.get(), wanted, owners)) {
+            return;
+        }
+        const int error = errno;
+        if (again || !(tdb ? error != EAGAIN && IsDamaged(path, tdb.get()) : IsNoDatabase(path, error))) {
+            Throw(path, error);
+        }
+        SetAside(path);
+    }
+}
+
+void KeepDamagedSecrets(const std::string& path) {
+    const OneAtATime only;
+    const Tdb tdb = Open(path, O_RDWR);
+    if (tdb || !IsNoDatabase(path, errno)) {
+        return;
+    }
+    try {
+        SetAside(path);
+    } catch (const std::system_error& error) {
+        Log(LOG_ERR, error.what());
     }
 }
 

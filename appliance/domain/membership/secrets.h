@@ -16,7 +16,7 @@ inline constexpr char kSecrets[] = "/var/lib/samba/private/secrets.tdb";
 bool HasMachineSecret(const std::string& path, const std::string& domain);
 
 // Copies the whole database as it is at one moment into a new file (0600) in place of `to`. A missing source gives an
-// empty copy. Throws std::system_error.
+// empty copy, and so does one that is no database (which stays, and is named in the log). Throws std::system_error.
 void CopySecrets(const std::string& from, const std::string& to);
 
 // The keys of one domain: those that end in "/NAME" for its NetBIOS name or its DNS name (may be empty). The SID of the
@@ -28,9 +28,13 @@ struct SecretsOwner {
 };
 
 // Makes the keys of `owners` in the database at `path` what they are in `source`, in one transaction that a crash can't
-// tear; every other key stays. With an empty `source` they are removed, and their bytes overwritten first. Programs that have the file open see the
-// change. Throws std::system_error.
+// tear; every other key stays. With an empty `source` they are removed, and their bytes overwritten first. Programs that
+// have the file open see the change. A file that is no database is kept as "PATH.damaged" (named in the log), and a new
+// one takes its place when there is something to store. Throws std::system_error.
 void ReplaceSecrets(const std::string& path, const std::string& source, const std::vector<SecretsOwner>& owners);
+
+// Keeps a file that is no database as "PATH.damaged", as ReplaceSecrets does; what fails is logged.
+void KeepDamagedSecrets(const std::string& path);
 
 // Are the stored machine passwords of a domain the same in both files? A missing one equals a missing one.
 bool SameMachineSecret(const std::string& first, const std::string& second, const std::string& domain);

@@ -170,11 +170,8 @@ int VORNWinSetTrustDomain(int setting) {
         if (setting != 0 && setting != 1) {
             return VORN_FAIL(BadArgument);
         }
-        const char* former = appliance::TrustedDomainsEnabled() ? "yes" : "no";
-        const char* wanted = setting == 1 ? "yes" : "no";
         // smb.conf is left alone: the join that this belongs to writes it, when it succeeds.
-        appliance::NoteTrustChange(former, wanted);
-        if (const std::error_code error = appliance::SetSetting("trustdomain", wanted)) {
+        if (const std::error_code error = appliance::ChangeTrustSetting(setting == 1)) {
             appliance::Log(LOG_ERR, Path(appliance::kSettings) + ": " + error.message());
             return error == std::errc::timed_out ? VORN_FAIL(FileLock) : VORN_FAIL(FileWrite);
         }

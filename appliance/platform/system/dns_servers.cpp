@@ -1,11 +1,11 @@
 #include "appliance/platform/system/dns_servers.h"
 
-#include <charconv>
 #include <chrono>
 #include <system_error>
 
 #include "appliance/base/file.h"
 #include "appliance/base/file_lock.h"
+#include "appliance/base/kept_copy.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/platform/system/resolv_conf.h"
@@ -15,7 +15,6 @@ namespace appliance {
 namespace {
 
 constexpr std::chrono::milliseconds kLockWait{10000};
-constexpr std::size_t kLargestFile = 1 << 20;
 constexpr mode_t kFileMode = 0644;
 
 std::optional<ErrorCode> Fail(ErrorCode code, const std::string& what) {
@@ -23,70 +22,14 @@ std::optional<ErrorCode> Fail(ErrorCode code, const std::string& what) {
     return code;
 }
 
-bool IsMissing(const std::error_code& error) {
-    return error == std::errc::no_such_file_or_directory;
-}
-
-// A file that may be missing.
-using Content = std::optional<std::string>;
-
 std::string TextOf(const Content& content) {
     return content.value_or("");
 }
 
-std::error_code Read(const std::string& path, Content& content) {
-    std::string text;
-    const std::error_code error = ReadFile(path, text, 4 * kLargestFile);
-    if (IsMissing(error)) {
-        content.reset();
-        return {};
-    }
-    content = std::move(text);
-    return error;
-}
-
-// What the file was, and what was made of it here.
-struct Copy {
-    Content before;
-    std::string after;
-};
-
-// "kept SIZE\n" or "missing 0\n", the bytes of the one, then the bytes of the other: whatever stands in the file, it
-// comes back as it was.
-std::string Format(const Copy& copy) {
-    const std::string before = TextOf(copy.before);
-    return (copy.before ? "kept " : "missing ") + std::to_string(before.size()) + "\n" + before + copy.after;
-}
-
-std::optional<Copy> Parse(const std::string& text) {
-    const std::size_t end = text.find('\n');
-    const std::size_t blank = text.find(' ');
-    if (end == std::string::npos || blank > end) {
-        return std::nullopt;
-    }
-    std::size_t size = 0;
-    const auto [rest, error] = std::from_chars(text.data() + blank + 1, text.data() + end, size);
-    const std::string word = text.substr(0, blank);
-    if (error != std::errc() || rest != text.data() + end || size > text.size() - end - 1 ||
-        (word != "kept" && word != "missing")) {
-        return std::nullopt;
-    }
-    Copy copy;
-    if (word == "kept") {
-        copy.before = text.substr(end + 1, size);
-    }
-    copy.after = text.substr(end + 1 + size);
-    return copy;
-}
-
 // The kept copy, when the file is still what was made of it.
-std::optional<Copy> CopyOf(const Content& current) {
-    Content kept;
-    if (Read(Path(kResolvCopy), kept) || !kept || !current) {
-        return std::nullopt;
-    }
-    std::optional<Copy> copy = Parse(*kept);
-    return copy && copy->after == *current ? copy : std::nullopt;
+std::optional<KeptCopy> CopyOf(const Content& current) {
+    std::optional<KeptCopy> copy = ReadKeptCopy(Path(kResolvCopy));
+    return copy && current && copy->after == *current ? copy : std::nullopt;
 }
 
 std::optional<ErrorCode> WriteFailure(const std::string& path, const std::error_code& error) {
@@ -113,9 +56,8 @@ std::optional<ErrorCode> BringBack(const Content& before) {
 
 // The copy as it was before a change that failed.
 void BringBackCopy(const Content& before, const Content& current) {
-    const std::error_code error = before == current
-                                      ? RemoveFile(Path(kResolvCopy))
-                                      : ReplaceFile(Path(kResolvCopy), Format({before, TextOf(current)}), 0600);
+    const std::error_code error =
+        before == current ? RemoveFile(Path(kResolvCopy)) : WriteKeptCopy(Path(kResolvCopy), {before, TextOf(current)});
     if (error) {
         Log(LOG_WARNING, "DNS servers: " + Path(kResolvCopy) + ": " + error.message());
     }
@@ -125,11 +67,8 @@ void BringBackCopy(const Content& before, const Content& current) {
 // `current` unless it was changed already.
 std::optional<ErrorCode> Change(const Content& before, const Content& current,
                                 const std::vector<std::string>& servers) {
-    const Copy copy = {before, WithServers(TextOf(before), servers)};
-    if (const std::error_code error = MakeFolder(Path(kPrivate), 0700)) {
-        return WriteFailure(Path(kPrivate), error);
-    }
-    if (const std::error_code error = ReplaceFile(Path(kResolvCopy), Format(copy), 0600)) {
+    const KeptCopy copy = {before, WithServers(TextOf(before), servers)};
+    if (const std::error_code error = WriteKeptCopy(Path(kResolvCopy), copy)) {
         return WriteFailure(Path(kResolvCopy), error);
     }
     if (const std::error_code error = ReplaceFile(Path(kResolvConf), copy.after, kFileMode)) {
@@ -150,7 +89,7 @@ std::optional<FileLock> TakeLock() {
 
 std::optional<ErrorCode> ReadDnsServers(std::vector<std::string>& servers) {
     Content current;
-    if (const std::error_code error = Read(Path(kResolvConf), current)) {
+    if (const std::error_code error = ReadContent(Path(kResolvConf), current)) {
         return Fail(ErrorCode::FileRead, Path(kResolvConf) + ": " + error.message());
     }
     servers = Servers(TextOf(current));
@@ -167,13 +106,13 @@ std::optional<ErrorCode> WriteDnsServers(const std::vector<std::string>& entries
         return Fail(ErrorCode::FileLock, "cannot lock the list");
     }
     Content current;
-    if (const std::error_code error = Read(Path(kResolvConf), current)) {
+    if (const std::error_code error = ReadContent(Path(kResolvConf), current)) {
         return Fail(ErrorCode::FileRead, Path(kResolvConf) + ": " + error.message());
     }
     if (*servers == Servers(TextOf(current))) {
         return std::nullopt;
     }
-    const std::optional<Copy> copy = CopyOf(current);
+    const std::optional<KeptCopy> copy = CopyOf(current);
     if (copy && *servers == Servers(TextOf(copy->before))) {
         return BringBack(copy->before);
     }

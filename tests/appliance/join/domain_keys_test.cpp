@@ -48,6 +48,20 @@ TEST(DomainKeys, OfActiveDirectory) {
     }
 }
 
+TEST(DomainKeys, AGivenControllerGoesWithTheJoinThatNamesNone) {
+    ConfFile conf(kWorkgroupConf);
+    FormerKeys former;
+    Membership membership = AdMembership("LAB", "LAB.TEST");
+    membership.passwordServer = "dc1.lab.test";
+    ASSERT_TRUE(appliance::WriteDomainKeys(membership, true, conf, former));
+    EXPECT_EQ(conf.Get("global", "password server"), "dc1.lab.test");
+    membership.passwordServer.clear();
+    ASSERT_TRUE(appliance::WriteDomainKeys(membership, true, conf, former));
+    EXPECT_EQ(conf.Get("global", "password server"), std::nullopt);
+    ASSERT_TRUE(appliance::WriteWorkgroupKeys("WORKGROUP", former, conf));
+    EXPECT_EQ(conf.text(), kWorkgroupConf);
+}
+
 TEST(DomainKeys, OfAnNt4StyleDomain) {
     ConfFile conf(std::string("[global]\n\tdisable netbios = Yes\n\trealm = OLD.TEST\n\tworkgroup = W\n"));
     FormerKeys former;

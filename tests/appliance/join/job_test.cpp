@@ -19,7 +19,6 @@
 #include "appliance/base/file_lock.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/process.h"
-#include "appliance/domain/join/launcher.h"
 #include "tests/appliance/join/join_test.h"
 
 namespace {
@@ -288,11 +287,53 @@ TEST_F(JobTest, ARejoinThatFailsLateKeepsTheSecretThatTheControllerHas) {
 
 TEST_F(JobTest, ARejoinWhoseToolFailsAsksWhichSecretWorks) {
     ASSERT_TRUE(Join().success);
+    Tool("/usr/bin/rpcclient", "echo 'name NAS1$: 0x458 (1)'");
     PutSecrets("/joined.tdb", SecretsOf("NT4DOM", "", "newer"));
     Net("case \"$*\" in *'rpc join'*) cp $R/joined.tdb $R/usr/vorn/etc/private/join/staging/secrets.tdb; exit 255;; "
         "*testjoin*) case \"$*\" in *staging*) ;; *) echo NT_STATUS_ACCESS_DENIED; exit 255;; esac;; esac");
     EXPECT_FALSE(Join().success);
     EXPECT_EQ(Secrets(kLive)["SECRETS/MACHINE_PASSWORD/NT4DOM"], "newer");
+}
+
+// The account was deleted on the controller: the old secret is dead anyway, and what the failed join made goes again.
+TEST_F(JobTest, ARejoinOfALostAccountThatFailsRemovesWhatItMade) {
+    ASSERT_TRUE(Join().success);
+    const std::string before = Content(appliance::kSmbConf);
+    PutSecrets("/joined.tdb", SecretsOf("NT4DOM", "", "newer"));
+    const char* const joinFails =
+        "case \"$*\" in *'rpc join'*) cp $R/joined.tdb $R/usr/vorn/etc/private/join/staging/secrets.tdb; exit 255;; "
+        "esac";
+    const char* const trustFails = "case \"$*\" in *check-secret*) exit 1;; esac";
+    for (const bool late : {false, true}) {
+        unlink(At("/calls").c_str());
+        Net(late ? "" : joinFails);
+        Tool("/usr/bin/wbinfo", late ? trustFails : "exit 0");
+        EXPECT_FALSE(Join().success);
+        EXPECT_THAT(Calls("user delete"), testing::ElementsAre(HasSubstr("-- NAS1$")));
+        EXPECT_THAT(Steps()["leftovers"], SizeIs(0));
+        EXPECT_EQ(Content(appliance::kSmbConf), before);
+        EXPECT_EQ(Secrets(kLive)["SECRETS/MACHINE_PASSWORD/NT4DOM"], "new");
+        EXPECT_TRUE(winbindRuns());
+        EXPECT_TRUE(std::filesystem::is_empty(At(appliance::kJoinJournal)));
+    }
+}
+
+// A controller that NetBIOS names for the short name is none of the realm that was asked for.
+TEST_F(JobTest, ADomainOfTheNt4StyleIsNoneWithADnsName) {
+    JoinRequest request;
+    request.domain = "NT4DOM";
+    request.realm = "nowhere.test";
+    request.credentials = {"admin", appliance::Secret(kCanary)};
+    const JobResult result = appliance::RunJob(request, {});
+    EXPECT_FALSE(result.success);
+    EXPECT_EQ(result.status.message, "Neither LDAP server nor PDC can be found.");
+    EXPECT_THAT(Steps()["steps"][1]["detail"].asString(), HasSubstr("not of nowhere.test"));
+    EXPECT_THAT(Calls("rpc join"), IsEmpty());
+    ExpectUntouched();
+    request.controller = address_;
+    EXPECT_EQ(appliance::RunJob(request, {}).status.message, "Invalid KDC ip.");
+    EXPECT_THAT(Calls("rpc join"), IsEmpty());
+    ExpectUntouched();
 }
 
 TEST_F(JobTest, RequestsThatCannotBeAreRefusedBeforeAnyToolRuns) {
@@ -350,6 +391,27 @@ TEST_F(JobTest, LeavingNeedsNoController) {
     EXPECT_EQ(Content(appliance::kSmbConf), kWorkgroupConf);
 }
 
+// The membership that it belonged to can be left, and joined again.
+TEST_F(JobTest, ADamagedDatabaseOfSecretsIsNoObstacle) {
+    for (const bool leaves : {true, false}) {
+        const char* const bytes = leaves ? "" : "no database";
+        ASSERT_TRUE(Join().success);
+        Put(kLive, bytes, 0600);
+        appliance::Membership membership;
+        ASSERT_FALSE(appliance::ReadMembership(membership));
+        EXPECT_TRUE(membership.DomainMode());
+        EXPECT_FALSE(membership.hasSecret);
+        if (leaves) {
+            EXPECT_TRUE(Leave().success);
+            EXPECT_EQ(Content(appliance::kSmbConf), kWorkgroupConf);
+            EXPECT_FALSE(Exists(kLive));
+        }
+        EXPECT_TRUE(Join().success);
+        EXPECT_EQ(Secrets(kLive)["SECRETS/MACHINE_PASSWORD/NT4DOM"], "new");
+        EXPECT_EQ(Content(std::string(kLive) + ".damaged"), bytes);
+    }
+}
+
 TEST_F(JobTest, LeavingWithAnAccountThatCannotBeDeletedChangesNothing) {
     ASSERT_TRUE(Join().success);
     const std::string before = Content(appliance::kSmbConf);
@@ -391,54 +453,6 @@ TEST_F(JobTest, OneAtATime) {
     EXPECT_EQ(result.status.message, "Another join or leave is still running.");
     EXPECT_FALSE(Exists(appliance::kJoinSteps));
     ExpectUntouched();
-}
-
-class LauncherTest : public join_test::JoinTest {
-protected:
-    static JobResult Run() {
-        JoinRequest request;
-        request.domain = "lab.test";
-        request.credentials = {"admin", appliance::Secret(kCanary)};
-        return appliance::RunJoinTool(request);
-    }
-};
-
-TEST_F(LauncherTest, HandsOverTheRequestAndBringsBackTheResult) {
-    Tool(appliance::kVornjoin,
-         "cat > $R/request; ps -o sid= -p $$ > $R/session; echo $$ >> $R/session; "
-         "echo '{\"success\":false,\"key\":\"join\",\"message\":\"Invalid KDC ip.\"}'; exit 1");
-    const JobResult result = Run();
-    EXPECT_FALSE(result.success);
-    EXPECT_EQ(result.status.message, "Invalid KDC ip.");
-    JoinRequest request;
-    std::string error;
-    ASSERT_TRUE(appliance::ParseJoinRequest(Content("/request"), request, error));
-    EXPECT_EQ(request.credentials.password.view(), kCanary);
-    EXPECT_THAT(Content("/calls"), Not(HasSubstr(kCanary)));
-}
-
-TEST_F(LauncherTest, AToolThatCannotBeStartedIsASystemError) {
-    EXPECT_EQ(Run().status.message, "Error System.");
-    appliance::JoinStatus status;
-    ASSERT_FALSE(appliance::ReadJoinStatus(status));
-    EXPECT_EQ(status.message, "Error System.");
-}
-
-TEST_F(LauncherTest, AToolThatDiesIsASystemErrorUnlessItsWorkWasDone) {
-    Tool(appliance::kVornjoin, "case \"$*\" in --recover) exit 0;; esac; kill -9 $$");
-    EXPECT_EQ(Run().status.message, "Error System.");
-    EXPECT_THAT(Calls("recover"), testing::ElementsAre("vornjoin --recover"));
-    Tool(appliance::kVornjoin, "case \"$*\" in --recover) exit 3;; esac; kill -9 $$");
-    EXPECT_TRUE(Run().success);
-    unlink(At("/calls").c_str());
-    Tool(appliance::kVornjoin, "case \"$*\" in --recover) exit 1;; --recover-old-later) exit 0;; esac; kill -9 $$");
-    EXPECT_EQ(Run().status.message, "Error System.");
-    EXPECT_THAT(Calls("later"), testing::ElementsAre("vornjoin --recover-old-later"));
-}
-
-TEST_F(LauncherTest, AnAnswerThatIsNoneIsASystemError) {
-    Tool(appliance::kVornjoin, "case \"$*\" in --recover) exit 0;; esac; echo hello");
-    EXPECT_EQ(Run().status.message, "Error System.");
 }
 
 }  // namespace

@@ -14,11 +14,11 @@
 #include "appliance/domain/join/detached_tool.h"
 #include "appliance/domain/join/journal.h"
 #include "appliance/domain/join/membership_files.h"
-#include "appliance/domain/join/provisional.h"
 #include "tests/appliance/join/join_test.h"
 
 namespace {
 
+using appliance::AccountState;
 using appliance::Journal;
 using appliance::Recovery;
 using appliance::Wanted;
@@ -59,7 +59,7 @@ protected:
         ASSERT_FALSE(appliance::ReadMembership(journal_.before));
         journal_.after = AdMembership("LAB", "LAB.TEST");
         journal_.controller = "192.0.2.9";
-        journal_.accountExisted = false;
+        journal_.accountBefore = account_;
         appliance::PrepareJoin(journal_, "192.0.2.9");
         if (stagedSecret) {
             std::map<std::string, std::string> records = SecretsOf("LAB", "LAB.TEST", "new");
@@ -106,6 +106,7 @@ protected:
 
     Journal journal_;
     std::string conf_;
+    AccountState account_ = AccountState::Unknown;
 };
 
 constexpr char kOk[] = "echo Join is OK";
@@ -178,10 +179,23 @@ TEST_F(RecoveryTest, APreparedJoinIsForgotten) {
 
 TEST_F(RecoveryTest, TheOwnAccountJoinedAgainAndNothingStored) {
     Interrupt(Phase::Joining, "LAB", false);
-    Answers(kDead, kDead);
+    Answers(kOk, kDead);
     EXPECT_EQ(appliance::RecoverInterruptedJoin().result, Result::Done);
     EXPECT_EQ(Password("LAB"), "old");
     ExpectOldOne();
+}
+
+// The controller may have been told a new password that never came here: while it does not answer, nobody knows.
+TEST_F(RecoveryTest, NothingStoredAndNobodyToAskIsNoSuccess) {
+    Interrupt(Phase::Joining, "LAB", false);
+    Answers(kDead, kDead);
+    EXPECT_EQ(appliance::RecoverOnce(kPatience, Wanted::Old).result, Result::Pending);
+    EXPECT_EQ(Password("LAB"), "old");
+    EXPECT_EQ(Content(appliance::kSmbConf), conf_);
+    Answers(kRefused, kDead);
+    EXPECT_EQ(appliance::RecoverOnce(kPatience, Wanted::OldOrNone).result, Result::Done);
+    EXPECT_EQ(Password("LAB"), "<none>");
+    ExpectNothingLeft();
 }
 
 TEST_F(RecoveryTest, TheOwnAccountJoinedAgainAndTheOldSecretWorks) {
@@ -278,6 +292,26 @@ TEST_F(RecoveryTest, AMemberOfAnotherDomainStaysIt) {
         EXPECT_EQ(Content("/etc/krb5.keytab"), "old keytab");
         ExpectOldOne();
     }
+}
+
+// Its own account was gone from the controller, so that there is nothing to go back to.
+TEST_F(RecoveryTest, ALostMembershipIsReplacedByANewOneThatWorks) {
+    account_ = AccountState::Absent;
+    for (const Phase phase : {Phase::Joining, Phase::Joined}) {
+        Interrupt(phase, "LAB");
+        Answers(kRefused, kOk);
+        const Recovery recovery = appliance::RecoverInterruptedJoin();
+        EXPECT_EQ(recovery.result, Result::Done);
+        EXPECT_TRUE(recovery.completed);
+        ExpectNewOne();
+    }
+    Interrupt(Phase::Joined, "LAB");
+    Answers(kRefused, kRefused);
+    const Recovery recovery = appliance::RecoverInterruptedJoin();
+    EXPECT_EQ(recovery.result, Result::Done);
+    EXPECT_THAT(recovery.notes, testing::Contains(HasSubstr("NAS1$")));
+    EXPECT_EQ(Password("LAB"), "old");
+    ExpectOldOne();
 }
 
 TEST_F(RecoveryTest, AFirstMembershipThatWorksIsPutInPlace) {
@@ -420,32 +454,8 @@ TEST_F(RecoveryTest, AToolThatStillRunsIsWaitedForAWhile) {
     EXPECT_EQ(Password("LAB"), "new");
 }
 
-TEST_F(RecoveryTest, ChangesAheadOfAJoinAreNamedOnce) {
-    appliance::NoteTrustChange("yes", "no");
-    const std::string before = "nameserver 192.0.2.7\n";
-    Put("/usr/vorn/etc/private/resolv.conf.kept",
-        "kept " + std::to_string(before.size()) + "\n" + before + Content(appliance::kResolvConf));
-    Recovery recovery = appliance::RecoverInterruptedJoin();
-    EXPECT_THAT(recovery.notes,
-                ElementsAre("the DNS servers are still 192.0.2.1,192.0.2.2; before the join: 192.0.2.7",
-                            "the trusted-domain setting is still changed; before the join: trustdomain=yes"));
-    recovery = appliance::RecoverInterruptedJoin();
-    EXPECT_THAT(recovery.notes, IsEmpty());
-}
-
-TEST_F(RecoveryTest, ChangesThatWerePutBackOrKeptAreNotNamed) {
-    appliance::NoteTrustChange("yes", "no");
-    appliance::NoteTrustChange("no", "yes");
-    EXPECT_THAT(appliance::RecoverInterruptedJoin().notes, IsEmpty());
-    appliance::NoteTrustChange("yes", "no");
-    appliance::KeepProvisionalChanges();
-    EXPECT_THAT(appliance::RecoverInterruptedJoin().notes, IsEmpty());
-    // A copy that is no longer the file's: somebody else has changed the servers since.
-    Put("/usr/vorn/etc/private/resolv.conf.kept", "kept 0\nnameserver 192.0.2.9\n");
-    EXPECT_THAT(appliance::RecoverInterruptedJoin().notes, IsEmpty());
-}
-
 TEST_F(RecoveryTest, AJournalIsReadBackAndLeavesNoSecret) {
+    account_ = AccountState::Absent;
     Interrupt(Phase::Swapped, "CORP");
     journal_.keepNewSecret = true;
     journal_.resetOptions = true;
@@ -457,7 +467,7 @@ TEST_F(RecoveryTest, AJournalIsReadBackAndLeavesNoSecret) {
     EXPECT_TRUE(read->before.hasSecret);
     EXPECT_EQ(read->after.realm, "LAB.TEST");
     EXPECT_EQ(read->controller, "192.0.2.9");
-    EXPECT_FALSE(read->accountExisted);
+    EXPECT_EQ(read->accountBefore, AccountState::Absent);
     EXPECT_TRUE(read->keepNewSecret);
     EXPECT_TRUE(read->resetOptions);
     EXPECT_FALSE(read->SameAccount());

@@ -4,6 +4,9 @@
 
 #include <fcntl.h>
 #include <krb5.h>
+#include <sched.h>
+#include <sys/mount.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <tdb.h>
@@ -134,6 +137,100 @@ TEST_F(SecretsTest, AMissingFileHasNothingToRemove) {
     PutSecrets(kOther, SecretsOf("LAB", "", "new"));
     appliance::ReplaceSecrets(At(kLive), At(kOther), {{"LAB", "", "NAS1"}});
     EXPECT_EQ(Secrets(kLive), SecretsOf("LAB", "", "new"));
+}
+
+// Nobody can make anything of it: it is no obstacle, and its bytes are kept.
+TEST_F(SecretsTest, ADamagedFileHoldsNothingAndIsKept) {
+    PutSecrets(kLive, Both());
+    const std::string whole = Content(kLive);
+    std::string torn = whole;
+    torn.replace(200, torn.size() - 200, torn.size() - 200, 'x');
+    for (const std::string& bytes : {std::string(), std::string("no database"), torn, std::string(9000, '\0')}) {
+        Put(kLive, bytes, 0600);
+        appliance::CopySecrets(At(kLive), At(kOther));
+        EXPECT_THAT(Secrets(kOther), testing::IsEmpty());
+        EXPECT_EQ(Content(kLive), bytes);
+        EXPECT_FALSE(Exists("/var/lib/samba/private/secrets.tdb.damaged"));
+
+        appliance::ReplaceSecrets(At(kLive), "", {{"LAB", "LAB.TEST", "NAS1"}});
+        EXPECT_FALSE(Exists(kLive));
+        EXPECT_EQ(Content("/var/lib/samba/private/secrets.tdb.damaged"), bytes);
+        unlink(At("/var/lib/samba/private/secrets.tdb.damaged").c_str());
+
+        Put(kLive, bytes, 0600);
+        PutSecrets(kOther, SecretsOf("LAB", "LAB.TEST", "new"));
+        appliance::ReplaceSecrets(At(kLive), At(kOther), {{"LAB", "LAB.TEST", "NAS1"}});
+        EXPECT_EQ(Secrets(kLive), SecretsOf("LAB", "LAB.TEST", "new"));
+        EXPECT_EQ(Content("/var/lib/samba/private/secrets.tdb.damaged"), bytes);
+        unlink(At("/var/lib/samba/private/secrets.tdb.damaged").c_str());
+    }
+}
+
+TEST_F(SecretsTest, OnlyADamagedFileIsSetAside) {
+    const char* const aside = "/var/lib/samba/private/secrets.tdb.damaged";
+    appliance::KeepDamagedSecrets(At(kLive));
+    EXPECT_FALSE(Exists(kLive));
+    PutSecrets(kLive, Both());
+    appliance::KeepDamagedSecrets(At(kLive));
+    EXPECT_EQ(Secrets(kLive), Both());
+    EXPECT_FALSE(Exists(aside));
+    Put(kLive, "no database", 0600);
+    appliance::KeepDamagedSecrets(At(kLive));
+    EXPECT_FALSE(Exists(kLive));
+    EXPECT_EQ(Content(aside), "no database");
+}
+
+// A whole one that can't be opened for writing now is not a damaged one.
+TEST_F(SecretsTest, AFolderThatTakesNothingIsNoDamage) {
+    PutSecrets(kLive, Both());
+    const pid_t child = fork();
+    if (child == 0) {
+        const std::string folder = appliance::FolderOf(At(kLive));
+        if (unshare(CLONE_NEWNS) != 0 || mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
+            mount(folder.c_str(), folder.c_str(), nullptr, MS_BIND, nullptr) != 0 ||
+            mount("none", folder.c_str(), nullptr, MS_REMOUNT | MS_BIND | MS_RDONLY, nullptr) != 0) {
+            _exit(100);
+        }
+        appliance::KeepDamagedSecrets(At(kLive));
+        int thrown = 0;
+        for (const bool copies : {true, false}) {
+            try {
+                copies ? appliance::CopySecrets(At(kLive), At("/copy.tdb"))
+                       : appliance::ReplaceSecrets(At(kLive), "", {{"LAB", "LAB.TEST", "NAS1"}});
+            } catch (const std::system_error& error) {
+                thrown += error.code().value() == EROFS ? 1 : 0;
+            }
+        }
+        _exit(thrown);
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(WEXITSTATUS(status), 2);
+    EXPECT_EQ(Secrets(kLive), Both());
+    EXPECT_FALSE(Exists("/copy.tdb"));
+}
+
+// The reason that the caller is told is the disk's, and the records stay.
+TEST_F(SecretsTest, ThatFindNoRoomStay) {
+    PutSecrets(kLive, SecretsOf("LAB", "LAB.TEST", "old"));
+    PutSecrets(kOther, SecretsOf("LAB", "LAB.TEST", std::string(2 << 20, 'n')));
+    const pid_t child = fork();
+    if (child == 0) {
+        signal(SIGXFSZ, SIG_IGN);
+        const rlimit limit = {1 << 20, 1 << 20};
+        setrlimit(RLIMIT_FSIZE, &limit);
+        try {
+            appliance::ReplaceSecrets(At(kLive), At(kOther), {{"LAB", "LAB.TEST", "NAS1"}});
+            _exit(0);
+        } catch (const std::system_error& error) {
+            _exit(error.code().value());
+        }
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(WEXITSTATUS(status), EFBIG);
+    EXPECT_EQ(Secrets(kLive), SecretsOf("LAB", "LAB.TEST", "old"));
+    EXPECT_FALSE(Exists("/var/lib/samba/private/secrets.tdb.damaged"));
 }
 
 TEST_F(SecretsTest, AreCompared) {
