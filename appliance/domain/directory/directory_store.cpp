@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <ctime>
 #include <filesystem>
 
 #include "appliance/base/file.h"
@@ -169,14 +170,16 @@ std::optional<EntryPage> ReadEntries(EntryKind kind, std::string_view domain, st
     return page;
 }
 
-int RemoveLists(const std::vector<std::string>& except) {
+int RemoveLists(const std::vector<std::string>& except, std::chrono::seconds age) {
+    const std::time_t stored = std::time(nullptr) - age.count();
     int removed = 0;
     bool failed = false;
     for (const ListInfo& list : ListNames()) {
         const bool stays = std::any_of(except.begin(), except.end(), [&list](const std::string& domain) {
             return EqualIgnoringCase(domain, list.domain);
         });
-        if (stays) {
+        struct stat file {};
+        if (stays || (stat(ListPath(list.kind, list.domain).c_str(), &file) == 0 && file.st_mtime > stored)) {
             continue;
         }
         // The link first: while it exists, the list that it stands for exists, too.

@@ -9,6 +9,7 @@
 #ifndef VORN_APPLIANCE_DOMAIN_DIRECTORY_DIRECTORY_STORE_H
 #define VORN_APPLIANCE_DOMAIN_DIRECTORY_DIRECTORY_STORE_H
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -65,8 +66,9 @@ std::optional<EntryPage> ReadEntries(EntryKind kind, std::string_view domain, st
                                      std::string_view search = {});
 
 // Removes the lists and links of every domain but those named (any case): what a leave, or a join of another domain,
-// leaves behind is no longer true. Returns how many lists went, -1 when one could not be removed.
-int RemoveLists(const std::vector<std::string>& except = {});
+// leaves behind is no longer true. A list that was stored less than `age` ago stays, too. Returns how many lists went, -1
+// when one could not be removed.
+int RemoveLists(const std::vector<std::string>& except = {}, std::chrono::seconds age = std::chrono::seconds(0));
 
 }  // namespace appliance
 

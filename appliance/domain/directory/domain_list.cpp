@@ -4,6 +4,7 @@
 #include <json/writer.h>
 
 #include <algorithm>
+#include <chrono>
 #include <sstream>
 
 #include "appliance/base/file.h"
@@ -21,6 +22,7 @@ namespace {
 constexpr std::chrono::milliseconds kWinbindTime{4000};
 constexpr std::chrono::milliseconds kOnlineTime{2000};
 constexpr std::chrono::milliseconds kAnswerTime{10000};
+constexpr std::chrono::hours kListsKept{7 * 24};
 constexpr Patience kPatience{std::chrono::seconds(20), std::chrono::seconds(30)};
 constexpr std::size_t kNameWidth = 16;  // of the column of names
 constexpr std::size_t kLongestFile = std::size_t{1} << 20;
@@ -223,7 +225,8 @@ bool RefreshDomains(const Membership& membership) {
         return false;
     }
     // Only winbind and the controller together know that there are no more: winbind forgets some, and the controller
-    // does not list those that are trusted through another one.
+    // does not list those that are trusted through another one. So a list goes only when its domain has been out of
+    // sight for longer than anybody forgets it.
     if (!confirmed) {
         Merge(domains, LoadDomains(membership));
     }
@@ -233,7 +236,7 @@ bool RefreshDomains(const Membership& membership) {
         for (const KnownDomain& domain : domains) {
             names.push_back(domain.name);
         }
-        RemoveLists(names);
+        RemoveLists(names, kListsKept);
     }
     return saved;
 }

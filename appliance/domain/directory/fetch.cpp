@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <deque>
 #include <system_error>
 
 #include "appliance/base/conf_file.h"
@@ -22,6 +23,8 @@ namespace appliance {
 namespace {
 
 constexpr Patience kPatience{std::chrono::seconds(45), std::chrono::minutes(30)};
+// While other domains wait for their turn.
+constexpr std::chrono::seconds kShortSilence{10};
 
 // The pid file of a fetch that runs, gone when it ends. A killed one leaves its file, which then names nobody.
 class PidFile {
@@ -148,10 +151,11 @@ Json::Value FetchInChild(EntryKind kind, const FetchDomain& domain, const Member
     return result;
 }
 
-void FetchOne(EntryKind kind, const FetchDomain& domain, const Membership& membership, FetchProgress& progress) {
+void FetchOne(EntryKind kind, const FetchDomain& domain, const Membership& membership, const Patience& patience,
+              FetchProgress& progress) {
     const auto started = std::chrono::steady_clock::now();
     const Json::Value result = RunWorker(
-        kPatience, [&](ProgressReport& report) { return FetchInChild(kind, domain, membership, report); },
+        patience, [&](ProgressReport& report) { return FetchInChild(kind, domain, membership, report); },
         [&](std::int64_t count) { progress.Count(count); });
     const auto took =
         std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now() - started).count();
@@ -161,6 +165,51 @@ void FetchOne(EntryKind kind, const FetchDomain& domain, const Membership& membe
     if (result["refused"].asInt64() > 0) {
         Log(LOG_WARNING, domain.name + ": " + std::to_string(result["refused"].asInt64()) + " " + Plural(kind) +
                              " left out, with control characters or no UTF-8 in their names");
+    }
+}
+
+void KeepOldList(EntryKind kind, const std::string& name, const DirectoryError& error) {
+    Log(LOG_ERR, name + ": " + Plural(kind) + " not fetched, the last list stays: " + error.what());
+    // A refresh of all domains begins with the removal of the links; the list that stays gets its own again.
+    if (IsListDomain(name) && !LinkList(kind, name)) {
+        Log(LOG_ERR, "cannot write " + ListLinkPath(kind, name));
+    }
+}
+
+// A domain that is silent lets the others go first, and has its full time behind them.
+void FetchInTurn(EntryKind kind, const std::vector<std::string>& domains, const Setting& setting,
+                 FetchProgress& progress, FetchResult& result) {
+    struct Turn {
+        std::string name;
+        bool again;
+    };
+    std::deque<Turn> turns;
+    for (const std::string& name : domains) {
+        turns.push_back({name, false});
+    }
+    while (!turns.empty()) {
+        const Turn turn = turns.front();
+        turns.pop_front();
+        const bool othersWait = !turn.again && !turns.empty();
+        const Patience patience{othersWait ? kShortSilence : kPatience.silence, kPatience.overall};
+        progress.Begin(turn.name);
+        const auto begun = std::chrono::steady_clock::now();
+        try {
+            FetchOne(kind, DomainOf(setting, turn.name), setting.membership, patience, progress);
+            ++result.stored;
+        } catch (const DirectoryError& error) {
+            const bool silent =
+                error.code() == ErrorCode::TimedOut && std::chrono::steady_clock::now() - begun < patience.overall;
+            if (silent && othersWait) {
+                Log(LOG_NOTICE, turn.name + ": " + Plural(kind) + ": " + error.what() + "; the other domains go first");
+                turns.push_back({turn.name, true});
+                continue;
+            }
+            result.code = error.code();
+            progress.Fail(error.what());
+            KeepOldList(kind, turn.name, error);
+        }
+        progress.End();
     }
 }
 
@@ -193,22 +242,7 @@ FetchResult FetchDirectory(EntryKind kind, const std::vector<std::string>& domai
     RemoveUnfinishedLists(kind);
     result.newRanges = setting.newRanges;
     FetchProgress progress(kind, static_cast<int>(domains.size()));
-    for (const std::string& name : domains) {
-        progress.Begin(name);
-        try {
-            FetchOne(kind, DomainOf(setting, name), setting.membership, progress);
-            ++result.stored;
-        } catch (const DirectoryError& error) {
-            result.code = error.code();
-            progress.Fail(error.what());
-            Log(LOG_ERR, name + ": " + Plural(kind) + " not fetched, the last list stays: " + error.what());
-            // A refresh of all domains begins with the removal of the links; the list that stays gets its own again.
-            if (IsListDomain(name) && !LinkList(kind, name)) {
-                Log(LOG_ERR, "cannot write " + ListLinkPath(kind, name));
-            }
-        }
-        progress.End();
-    }
+    FetchInTurn(kind, domains, setting, progress, result);
     result.failures = progress.failures();
     return result;
 }

@@ -20,7 +20,7 @@ struct FetchResult {
 };
 
 // Fetches one domain after the other, each in a child process that is ended when it makes no progress for 45 seconds or
-// takes longer than 30 minutes. The caller's pid stands in the kind's pid file meanwhile; a second fetch of a kind does
+// takes longer than 30 minutes. One that is silent for 10 seconds while others wait comes again behind them. The caller's pid stands in the kind's pid file meanwhile; a second fetch of a kind does
 // not start. Each failure is logged and stands in the progress file. A domain is named by its NetBIOS or DNS name.
 // Active Directory is asked by LDAP, or by RPC with "enable nt4 enum"; NT4-style domains by RPC.
 // For a process of its own: it forks.

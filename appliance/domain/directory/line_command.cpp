@@ -9,6 +9,7 @@
 #include <array>
 #include <cerrno>
 #include <csignal>
+#include <optional>
 
 #include "appliance/base/child_process.h"
 #include "appliance/base/file.h"
@@ -21,6 +22,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::size_t kLongestErrors = 4096;
 constexpr std::size_t kLongestLine = 65536;
+constexpr std::chrono::milliseconds kPauseWithoutHandle{10};
 
 struct Pipe {
     FileDescriptor reading;
@@ -45,6 +47,22 @@ std::vector<char*> Pointers(std::vector<std::string>& texts) {
     }
     pointers.push_back(nullptr);
     return pointers;
+}
+
+// How the program ended; nothing when it still runs at `end`.
+std::optional<ChildEnd> EndOf(ChildProcess& program, Clock::time_point end) {
+    for (;;) {
+        if (const std::optional<ChildEnd> ended = program.Look()) {
+            return ended;
+        }
+        const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - Clock::now());
+        if (left.count() <= 0) {
+            return std::nullopt;
+        }
+        pollfd wait{program.handle(), POLLIN, 0};
+        const auto most = program.handle() >= 0 ? std::chrono::milliseconds(60000) : kPauseWithoutHandle;
+        poll(&wait, 1, static_cast<int>(std::min(left, most).count()));
+    }
 }
 
 }  // namespace
@@ -74,6 +92,7 @@ CommandResult RunLines(const Command& command, const std::function<void(const st
         return result;
     }
     if (pid == 0) {
+        setpgid(0, 0);
         prctl(PR_SET_PDEATHSIG, SIGKILL);
         std::signal(SIGPIPE, SIG_DFL);
         if (getppid() == parent && dup2(nothing.get(), 0) == 0 && dup2(output.writing.get(), 1) == 1 &&
@@ -86,7 +105,8 @@ CommandResult RunLines(const Command& command, const std::function<void(const st
         }
         _exit(127);
     }
-    ChildProcess program(pid);
+    setpgid(pid, pid);  // whichever of the two comes first
+    ChildProcess program(pid, ChildProcess::Reach::Group);
     output.writing.Reset();
     errors.writing.Reset();
     start.writing.Reset();
@@ -147,12 +167,19 @@ CommandResult RunLines(const Command& command, const std::function<void(const st
     result.took = std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - started);
     if (timedOut) {
         result.end = CommandResult::End::TimedOut;
-        return result;  // its owner ends it
+        return result;  // its owner ends it, and what it started
     }
     if (!text.empty()) {
         take(text);
     }
-    SetEnd(program.Wait(), result);
+    // It may have closed its outputs and go on.
+    const std::optional<ChildEnd> ended = EndOf(program, end);
+    result.took = std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - started);
+    if (ended) {
+        SetEnd(*ended, result);
+    } else {
+        result.end = CommandResult::End::TimedOut;
+    }
     return result;
 }
 

@@ -11,9 +11,9 @@
 namespace appliance {
 
 // Runs the command like Run, but hands out each line of its standard output (without its end) as it comes; `output` of
-// the result stays empty. It stays in the caller's process group and ends with the caller, whatever the command says of
-// that; its deadline counts from the last line on. `take` may throw: the program is ended then. Secrets and an input
-// are not supported. For a process of one thread.
+// the result stays empty. It has a process group of its own and ends with the caller, whatever the command says of that.
+// Its deadline counts from the last line on, and ends the whole group. `take` may throw: the group is ended then. Secrets
+// and an input are not supported. For a process of one thread.
 CommandResult RunLines(const Command& command, const std::function<void(const std::string&)>& take);
 
 }  // namespace appliance

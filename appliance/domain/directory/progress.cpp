@@ -100,7 +100,7 @@ bool IsBefore(const timespec& one, const timespec& other) {
 std::optional<std::time_t> StartingSince() {
     struct stat marker {};
     struct stat record {};
-    if (lstat(Path(kUpdatingMarker).c_str(), &marker) != 0 || marker.st_uid != 0) {
+    if (lstat(Path(kUpdatingMarker).c_str(), &marker) != 0 || !S_ISREG(marker.st_mode) || marker.st_uid != 0) {
         return std::nullopt;
     }
     if (lstat(Path(kRefreshProgress).c_str(), &record) == 0 && !IsBefore(record.st_mtim, marker.st_mtim)) {

@@ -29,15 +29,8 @@ std::int64_t Now(clockid_t clock) {
     return time.tv_sec * kNanoseconds + time.tv_nsec;
 }
 
-// What a controller said, and when.
-struct Answer {
-    std::string controller;
-    std::int64_t seconds = 0;  // since 1970
-    std::int64_t at = 0;       // of the clock that nobody sets
-};
-
-std::optional<Answer> AskController(const Controller& controller) {
-    Answer answer;
+std::optional<ControllerTime> AskController(const Controller& controller) {
+    ControllerTime answer;
     answer.controller = controller.name.empty() ? controller.address : controller.name;
     SambaCall call;
     call.arguments = {"time", "-S", answer.controller};
@@ -59,39 +52,19 @@ std::string Signed(std::int64_t seconds) {
     return (seconds > 0 ? "+" : "") + std::to_string(seconds) + " s";
 }
 
-bool SetClock(const Answer& answer, std::int64_t offset) {
+bool SetClock(const ControllerTime& answer, std::int64_t offset, const ClockSetter& set) {
     // Full seconds are told: on average half a second has passed since.
     const std::int64_t now = answer.seconds * kNanoseconds + kNanoseconds / 2 + (Now(CLOCK_MONOTONIC) - answer.at);
     timespec time{};
     time.tv_sec = now / kNanoseconds;
     time.tv_nsec = now % kNanoseconds;
-    if (clock_settime(CLOCK_REALTIME, &time) != 0) {
+    if (set(CLOCK_REALTIME, &time) != 0) {
         Log(LOG_ERR, "the clock differs by " + Signed(offset) + " from that of " + answer.controller +
                          " and can't be set: " + strerror(errno));
         return false;
     }
     Log(LOG_NOTICE, "the clock has been set by " + Signed(offset) + " to that of " + answer.controller);
     return true;
-}
-
-bool Follow(const Answer& answer) {
-    const std::int64_t own = Now(CLOCK_REALTIME) / kNanoseconds;
-    const std::int64_t offset = answer.seconds - own;
-    switch (DecideStep(own, answer.seconds)) {
-        case ClockStep::None:
-            Log(LOG_INFO, "the clock agrees with that of " + answer.controller);
-            return true;
-        case ClockStep::Set:
-            return SetClock(answer, offset);
-        case ClockStep::TooFar:
-            Log(LOG_ERR, "the clock differs by " + Signed(offset) + " from that of " + answer.controller +
-                             ", more than a day, and is not set: see to one of them by hand");
-            return false;
-        case ClockStep::Impossible:
-            break;
-    }
-    Log(LOG_ERR, "the clock of " + answer.controller + " shows a time in the past and is not followed");
-    return false;
 }
 
 }  // namespace
@@ -127,6 +100,26 @@ std::optional<std::int64_t> ParseTime(const std::string& text) {
     return seconds;
 }
 
+bool FollowClock(const ControllerTime& answer, const ClockSetter& set) {
+    const std::int64_t own = Now(CLOCK_REALTIME) / kNanoseconds;
+    const std::int64_t offset = answer.seconds - own;
+    switch (DecideStep(own, answer.seconds)) {
+        case ClockStep::None:
+            Log(LOG_INFO, "the clock agrees with that of " + answer.controller);
+            return true;
+        case ClockStep::Set:
+            return SetClock(answer, offset, set);
+        case ClockStep::TooFar:
+            Log(LOG_ERR, "the clock differs by " + Signed(offset) + " from that of " + answer.controller +
+                             ", more than a day, and is not set: see to one of them by hand");
+            return false;
+        case ClockStep::Impossible:
+            break;
+    }
+    Log(LOG_ERR, "the clock of " + answer.controller + " shows a time in the past and is not followed");
+    return false;
+}
+
 bool SynchroniseTime() {
     Membership membership;
     if (const std::error_code error = ReadMembership(membership)) {
@@ -143,8 +136,8 @@ bool SynchroniseTime() {
     domain.own = true;
     try {
         for (const Controller& controller : ControllersOf(domain, membership)) {
-            if (const std::optional<Answer> answer = AskController(controller)) {
-                return Follow(*answer);
+            if (const std::optional<ControllerTime> answer = AskController(controller)) {
+                return FollowClock(*answer);
             }
         }
         Log(LOG_ERR, "no controller of " + membership.domain + " tells the time");

@@ -1,6 +1,9 @@
 #include "tests/appliance/directory/directory_test.h"
 
+#include <arpa/inet.h>
 #include <fcntl.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <tdb.h>
 #include <unistd.h>
@@ -26,6 +29,19 @@ std::string DirectoryTest::ControllerAddress() {
     const auto pid = static_cast<unsigned>(getpid());
     return "127." + std::to_string(64 + pid / 62500 % 128) + "." + std::to_string(1 + pid / 250 % 250) + "." +
            std::to_string(1 + pid % 250);
+}
+
+appliance::FileDescriptor DirectoryTest::ListenAsController() {
+    appliance::FileDescriptor listener(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    const int on = 1;
+    setsockopt(listener.get(), SOL_SOCKET, SO_REUSEADDR, &on, sizeof(on));
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(445);
+    inet_pton(AF_INET, ControllerAddress().c_str(), &address.sin_addr);
+    EXPECT_EQ(bind(listener.get(), reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
+    EXPECT_EQ(listen(listener.get(), 16), 0);
+    return listener;
 }
 
 void DirectoryTest::MakeMember(bool activeDirectory) {

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "appliance/base/file.h"
 #include "appliance/domain/directory/directory_store.h"
 #include "appliance/domain/membership/membership.h"
 #include "tests/appliance/base/temporary_folder.h"
@@ -19,6 +20,8 @@ protected:
 
     // An address of the loopback that no other test process uses: the controller of MakeMember.
     static std::string ControllerAddress();
+    // Its port for sessions, open as long as the descriptor is.
+    static appliance::FileDescriptor ListenAsController();
 
     // The appliance as a member of LAB (lab.test), Active Directory or NT4-style, with LAB's and OTHER's ids.
     static void MakeMember(bool activeDirectory);

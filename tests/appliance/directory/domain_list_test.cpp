@@ -1,5 +1,10 @@
 #include "appliance/domain/directory/domain_list.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include <ctime>
+
 #include "appliance/base/paths.h"
 #include "tests/appliance/directory/directory_test.h"
 
@@ -172,6 +177,15 @@ TEST_F(DomainListTest, RefreshFailsWhenNobodyAnswers) {
     PutWinbind(List(kExternal), kOnline);
     EXPECT_TRUE(appliance::RefreshDomains(membership));
     EXPECT_EQ(LoadDomains(membership), (Domains{{"LAB", "", true}, kOld}));
+    // Winbind may have forgotten it for once.
+    EXPECT_EQ(Listed(appliance::EntryKind::User, "OTHER"), std::vector<std::string>{"zed"});
+    for (const auto& [domain, hours] : {std::pair("OTHER", 7 * 24 + 1), std::pair("LAB", 9 * 24)}) {
+        const std::string list = appliance::ListPath(appliance::EntryKind::User, domain);
+        const timespec then = {std::time(nullptr) - hours * 3600, 0};
+        const timespec times[] = {then, then};
+        ASSERT_EQ(utimensat(AT_FDCWD, list.c_str(), times, 0), 0);
+    }
+    EXPECT_TRUE(appliance::RefreshDomains(membership));
     EXPECT_EQ(Listed(appliance::EntryKind::User, "OTHER"), std::vector<std::string>{"<none>"});
     EXPECT_EQ(Listed(appliance::EntryKind::User, "LAB"), std::vector<std::string>{"alice"});
 }

@@ -1,9 +1,7 @@
 #include "appliance/domain/directory/fetch.h"
 
-#include <arpa/inet.h>
 #include <json/reader.h>
-#include <netinet/in.h>
-#include <sys/socket.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -40,15 +38,7 @@ protected:
         EXPECT_TRUE(appliance::SaveDomains({{"LAB", "", true}, {"OTHER", "", false}}));
         PutAnswer("nmblookup", "", 1);
         PutAnswer("wbinfo", "", 1);
-        listener_.Reset(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-        const int on = 1;
-        setsockopt(listener_.get(), SOL_SOCKET, SO_REUSEADDR, &on, sizeof(on));
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_port = htons(445);
-        inet_pton(AF_INET, ControllerAddress().c_str(), &address.sin_addr);
-        EXPECT_EQ(bind(listener_.get(), reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
-        EXPECT_EQ(listen(listener_.get(), 16), 0);
+        listener_ = ListenAsController();
     }
 
     static Json::Value Progress() {
@@ -115,6 +105,28 @@ TEST_F(FetchTest, StoresTheOthersWhenOneDomainIsDead) {
     EXPECT_EQ(errors[0]["domain"].asString(), "OTHER");
     EXPECT_EQ(errors[0]["kind"].asString(), "user");
     EXPECT_EQ(errors[0]["reason"].asString(), "no domain controller of OTHER can be found");
+}
+
+// It answers in the end: its list is new, too, but no other domain has waited for it.
+TEST_F(FetchTest, ASilentDomainLetsTheOthersGoFirst) {
+    EXPECT_TRUE(appliance::SaveDomains({{"LAB", "", true}, {"OTHER", "", false}}));
+    PutProgram("nmblookup", "echo '" + ControllerAddress() + " OTHER<1b>'");
+    // The first question, which is about OTHER, has no answer.
+    PutProgram("rpcclient", "if [ ! -e '" + folder / "asked" + "' ]; then touch '" + folder / "asked" +
+                                "'; exec sleep 60; fi\nprintf '" + kAlice + "'");
+    const FetchResult result = FetchDirectory(EntryKind::User, {"OTHER", "LAB"});
+    EXPECT_EQ(result.stored, 2);
+    EXPECT_TRUE(result.failures.empty());
+    const auto lab = appliance::ReadEntries(EntryKind::User, "LAB", 0, 1);
+    const auto other = appliance::ReadEntries(EntryKind::User, "OTHER", 0, 1);
+    ASSERT_TRUE(lab && other);
+    struct stat first {};
+    struct stat second {};
+    ASSERT_EQ(stat(appliance::ListPath(EntryKind::User, "LAB").c_str(), &first), 0);
+    ASSERT_EQ(stat(appliance::ListPath(EntryKind::User, "OTHER").c_str(), &second), 0);
+    EXPECT_LT(std::pair(first.st_mtim.tv_sec, first.st_mtim.tv_nsec),
+              std::pair(second.st_mtim.tv_sec, second.st_mtim.tv_nsec));
+    EXPECT_EQ(Progress()["domains_done"].asInt(), 2);
 }
 
 TEST_F(FetchTest, KeepsTheGoodListFromBadAnswers) {

@@ -4,7 +4,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <stdexcept>
+
+#include "appliance/base/process.h"
 
 namespace appliance {
 namespace {
@@ -39,11 +42,14 @@ TEST(LineCommandTest, HandsOutEachLine) {
     EXPECT_TRUE(Take(Shell("true")).result.Succeeded());
 }
 
-TEST(LineCommandTest, StaysInTheGroupWithACleanEnvironment) {
+TEST(LineCommandTest, HasAGroupOfItsOwnAndACleanEnvironment) {
     setenv("LEAK", "secret", 1);
-    const Taken taken = Take(Shell("echo \"$LEAK-$LC_ALL\"; cut -d' ' -f5 /proc/self/stat; wc -c"));
+    const Taken taken = Take(Shell("echo \"$LEAK-$LC_ALL\"; echo $$; cut -d' ' -f5 /proc/$$/stat; wc -c"));
     unsetenv("LEAK");
-    EXPECT_EQ(taken.lines, (std::vector<std::string>{"-C", std::to_string(getpgrp()), "0"}));
+    ASSERT_EQ(taken.lines.size(), 4u);
+    EXPECT_EQ(taken.lines[0], "-C");
+    EXPECT_EQ(taken.lines[1], taken.lines[2]) << "it leads its group";
+    EXPECT_EQ(taken.lines[3], "0");
 }
 
 TEST(LineCommandTest, TakesAnyAmount) {
@@ -91,6 +97,55 @@ TEST(LineCommandTest, EndsTheProgramWhenItsLinesAreRefused) {
         RunLines(Shell("echo one; exec sleep 60"), [](const std::string&) { throw std::runtime_error("refused"); }),
         std::runtime_error);
     EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(5));
+}
+
+// The pid that the script prints first.
+pid_t FirstOf(const std::vector<std::string>& lines) {
+    return lines.empty() ? 0 : std::stoi(lines[0]);
+}
+
+// A moment may pass until a process that was killed is collected.
+bool IsGone(pid_t pid) {
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(5);
+    while (ProcessStart(pid)) {
+        if (std::chrono::steady_clock::now() >= end) {
+            return false;
+        }
+        usleep(5000);
+    }
+    return true;
+}
+
+TEST(LineCommandTest, ItsDeadlineEndsWhatItStarted) {
+    const Taken taken = Take(Shell("sleep 60 & echo $!; wait", milliseconds(300)));
+    EXPECT_EQ(taken.result.end, CommandResult::End::TimedOut);
+    ASSERT_GT(FirstOf(taken.lines), 0);
+    EXPECT_TRUE(IsGone(FirstOf(taken.lines)));
+}
+
+TEST(LineCommandTest, RefusedLinesEndWhatItStarted) {
+    pid_t child = 0;
+    EXPECT_THROW(RunLines(Shell("sleep 60 & echo $!; wait"),
+                          [&child](const std::string& line) {
+                              child = std::stoi(line);
+                              throw std::runtime_error("refused");
+                          }),
+                 std::runtime_error);
+    ASSERT_GT(child, 0);
+    EXPECT_TRUE(IsGone(child));
+}
+
+TEST(LineCommandTest, ItsDeadlineCountsWithoutOutputsToo) {
+    const Taken taken = Take(Shell("echo $$; exec sleep 60 >&- 2>&-", milliseconds(300)));
+    EXPECT_EQ(taken.result.end, CommandResult::End::TimedOut);
+    EXPECT_GE(taken.result.took, milliseconds(300));
+    EXPECT_LT(taken.result.took, milliseconds(5000));
+    ASSERT_GT(FirstOf(taken.lines), 0);
+    EXPECT_TRUE(IsGone(FirstOf(taken.lines)));
+    const Taken late = Take(Shell("exec >&- 2>&-; sleep 0.3; exit 4"));
+    EXPECT_EQ(late.result.end, CommandResult::End::Exited);
+    EXPECT_EQ(late.result.code, 4);
+    EXPECT_GE(late.result.took, milliseconds(300));
 }
 
 }  // namespace

@@ -208,6 +208,21 @@ TEST_F(OperationsTest, FetchTellsAFailureAndKeepsTheList) {
     EXPECT_NE(Got(Path(appliance::kRefreshProgress)).find("\"domains\":1"), std::string::npos);
 }
 
+TEST_F(OperationsTest, AFetchThatStoresAPartIsAFailureOfItsOwn) {
+    MakeMember(false);
+    const appliance::FileDescriptor controller = ListenAsController();
+    PutAnswer("nmblookup", "", 1);
+    PutAnswer("rpcclient", "index: 0x1 RID: 0x3e8 acb: 0x00000010 Account: alice\tName: Alice\tDesc: \n");
+    Publish(EntryKind::User, "OTHER", {"zed"});
+    List domains({"OTHER", "LAB"});
+    EXPECT_EQ(VORNWinGetDomainUGByDomain(0, domains.get()), 1);
+    EXPECT_EQ(LastError(), ErrorCode::Unreachable);
+    EXPECT_THAT(Listed(EntryKind::User, "LAB"), ElementsAre("alice"));
+    EXPECT_THAT(Listed(EntryKind::User, "OTHER"), ElementsAre("zed"));
+    PutAnswer("rpcclient", "", 1);
+    EXPECT_EQ(VORNWinGetDomainUGByDomain(0, domains.get()), -1);
+}
+
 // As callers that look at the pid file first do, it counts a fetch that runs as its own.
 TEST_F(OperationsTest, FetchStepsAsideForOneThatRuns) {
     int ends[2];
