@@ -109,7 +109,8 @@ int Serve(const Options& options) {
     LoadModules(options, table);
     RepairLeftovers();
     const Router router(table, ReadDescriptions(Path(kDescriptions)), HostOf(options));
-    const auto server = std::make_unique<Server>(std::move(listener.socket), path, router, FindDoor(options.door));
+    const auto server =
+        std::make_unique<Server>(std::move(listener.socket), path, router, FindDoor(options.door), options.patience);
     guard.Served();
     Log(LOG_NOTICE, std::string("version " VORN_VERSION " serves ") + std::to_string(table.apis().size()) +
                         " APIs of " + std::to_string(table.ModuleCount()) + " modules on " + path);

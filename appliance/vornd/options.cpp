@@ -3,8 +3,21 @@
 #include <getopt.h>
 
 #include <array>
+#include <charconv>
+#include <string_view>
 
 namespace appliance {
+
+namespace {
+
+bool ReadSeconds(std::string_view text, std::chrono::seconds& seconds) {
+    unsigned number = 0;
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    seconds = std::chrono::seconds(number);
+    return error == std::errc() && end == text.data() + text.size() && seconds <= kDrainLimit;
+}
+
+}  // namespace
 
 const char* const kHelp =
     "Usage: vornd [OPTION]...\n"
@@ -14,6 +27,7 @@ const char* const kHelp =
     "  --socket FILE   listen on FILE instead of /run/vorn/vornd.sock\n"
     "  --module FILE   load FILE beside the modules in /usr/vorn/lib/modules; may be given several times\n"
     "  --door ACCOUNT  whose processes may log administrators in, instead of vorn-httpd; for tests\n"
+    "  --drain SECONDS leave running calls behind so long after the signal to end, instead of 300; for tests\n"
     "  --root FOLDER   look for the appliance's files under FOLDER; for tests\n"
     "  --task ID       run the recorded background task ID and end; used by the server itself\n"
     "  --help          show this text and end\n"
@@ -23,16 +37,17 @@ const char* const kHelp =
     "Exit status: 0 ended in order, 1 could not start or left calls behind, 2 wrong command line.\n";
 
 bool ParseOptions(int count, char** arguments, Options& options, std::string& reason) {
-    enum Option : int { Foreground = 256, Socket, ModuleFile, Door, Root, Task, Help, Version };
-    const std::array<option, 9> known{{{"foreground", no_argument, nullptr, Foreground},
-                                       {"socket", required_argument, nullptr, Socket},
-                                       {"module", required_argument, nullptr, ModuleFile},
-                                       {"door", required_argument, nullptr, Door},
-                                       {"root", required_argument, nullptr, Root},
-                                       {"task", required_argument, nullptr, Task},
-                                       {"help", no_argument, nullptr, Help},
-                                       {"version", no_argument, nullptr, Version},
-                                       {nullptr, 0, nullptr, 0}}};
+    enum Option : int { Foreground = 256, Socket, ModuleFile, Door, Drain, Root, Task, Help, Version };
+    const std::array<option, 10> known{{{"foreground", no_argument, nullptr, Foreground},
+                                        {"socket", required_argument, nullptr, Socket},
+                                        {"module", required_argument, nullptr, ModuleFile},
+                                        {"door", required_argument, nullptr, Door},
+                                        {"drain", required_argument, nullptr, Drain},
+                                        {"root", required_argument, nullptr, Root},
+                                        {"task", required_argument, nullptr, Task},
+                                        {"help", no_argument, nullptr, Help},
+                                        {"version", no_argument, nullptr, Version},
+                                        {nullptr, 0, nullptr, 0}}};
     optind = 1;
     opterr = 0;
     for (;;) {
@@ -58,6 +73,13 @@ bool ParseOptions(int count, char** arguments, Options& options, std::string& re
                 break;
             case Door:
                 options.door = optarg;
+                break;
+            case Drain:
+                if (!ReadSeconds(optarg, options.patience)) {
+                    reason = std::string("option \"--drain\" takes a number of seconds up to ") +
+                             std::to_string(kDrainLimit.count());
+                    return false;
+                }
                 break;
             case Root:
                 options.root = optarg;

@@ -3,10 +3,12 @@
 #ifndef VORN_APPLIANCE_VORND_OPTIONS_H
 #define VORN_APPLIANCE_VORND_OPTIONS_H
 
+#include <chrono>
 #include <string>
 #include <vector>
 
 #include "appliance/vornd/access.h"
+#include "appliance/web/limits.h"
 
 namespace appliance {
 
@@ -17,6 +19,7 @@ struct Options {
     std::string root;    // in front of all fixed paths; for tests
     std::string socket;  // empty: the appliance's own
     std::string door = kDoorAccount;
+    std::chrono::seconds patience = kDrainLimit;  // for calls that run when the server is told to end
     std::vector<std::string> modules;
     std::string task;  // id of a recorded task
 };

@@ -36,7 +36,8 @@ void Refuse(const FileDescriptor& descriptor, ServerCode code) {
 
 }  // namespace
 
-Server::Server(FileDescriptor listener, std::string path, const Router& router, std::optional<uid_t> door)
+Server::Server(FileDescriptor listener, std::string path, const Router& router, std::optional<uid_t> door,
+               std::chrono::seconds patience)
     : sessions_(Path(kSessions), SessionClock::OfTheMachine()),
       sessionRoutes_(sessions_, SessionClock::OfTheMachine(), Authenticate),
       gate_({router, sessions_, sessionRoutes_, metrics_, [this] { return ReadGauges(); }}),
@@ -44,6 +45,7 @@ Server::Server(FileDescriptor listener, std::string path, const Router& router, 
       listener_(loop_, Protocol(), listener.Release()),
       path_(std::move(path)),
       door_(door),
+      patience_(patience),
       signals_(loop_, SIGTERM, SIGINT, SIGHUP),
       pause_(loop_),
       beat_(loop_),
@@ -184,7 +186,7 @@ void Server::Drain() {
     for (const std::shared_ptr<Connection>& connection : connections) {
         connection->Drain();
     }
-    drainLimit_.expires_after(kDrainLimit);
+    drainLimit_.expires_after(patience_);
     drainLimit_.async_wait([this](Error error) {
         if (!error) {
             Log(LOG_ERR, std::to_string(lanes_.Running()) + " calls did not end and are left behind");

@@ -7,6 +7,7 @@
 #include <boost/asio/local/stream_protocol.hpp>
 #include <boost/asio/signal_set.hpp>
 #include <boost/asio/steady_timer.hpp>
+#include <chrono>
 #include <memory>
 #include <optional>
 #include <string>
@@ -26,13 +27,15 @@ namespace appliance {
 class Server {
 public:
     // `listener` is a listening, non-blocking socket; `path` its file, which goes when the server begins to end.
-    // `router` outlives the server. `door` is the user who may log administrators in, when there is one.
-    Server(FileDescriptor listener, std::string path, const Router& router, std::optional<uid_t> door);
+    // `router` outlives the server. `door` is the user who may log administrators in, when there is one. `patience` is
+    // for the calls that run when it is told to end.
+    Server(FileDescriptor listener, std::string path, const Router& router, std::optional<uid_t> door,
+           std::chrono::seconds patience);
     Server(const Server&) = delete;
     Server& operator=(const Server&) = delete;
 
     // Serves until SIGTERM, SIGINT or SIGHUP, and then until the calls that run are answered. False when some were left
-    // behind because kDrainLimit passed: their threads can't be ended, so the process must be.
+    // behind because the server's patience was over: their threads can't be ended, so the process must be.
     bool Run();
 
 private:
@@ -57,6 +60,7 @@ private:
     boost::asio::local::stream_protocol::acceptor listener_;
     const std::string path_;
     const std::optional<uid_t> door_;
+    const std::chrono::seconds patience_;
     boost::asio::signal_set signals_;
     boost::asio::steady_timer pause_;
     boost::asio::steady_timer beat_;

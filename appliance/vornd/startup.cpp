@@ -16,6 +16,7 @@
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/process.h"
+#include "appliance/base/settings.h"
 #include "appliance/domain/join/recovery.h"
 #include "appliance/domain/membership/membership.h"
 #include "appliance/platform/system/task_store.h"
@@ -23,8 +24,6 @@
 
 namespace appliance {
 namespace {
-
-// A writer that lives still has its temporary file in hand for some seconds.
 
 bool Exists(const std::string& path) {
     struct stat found {};
@@ -35,6 +34,16 @@ void CopyDefault(const char* target, mode_t mode) {
     const std::string path = Path(target);
     if (Exists(path)) {
         return;
+    }
+    std::optional<SettingsLock> lock;
+    if (SettingsLock::Guards(path)) {
+        lock = SettingsLock::Take();
+        if (!lock) {
+            throw StartError(path + " can't be made: its lock can't be had: " + std::strerror(errno));
+        }
+        if (Exists(path)) {
+            return;
+        }
     }
     const std::string source = Path(kDefaults) + "/" + NameOf(target);
     std::string content;

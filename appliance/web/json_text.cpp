@@ -3,6 +3,7 @@
 #include <json/reader.h>
 #include <json/writer.h>
 
+#include <boost/algorithm/string/replace.hpp>
 #include <cmath>
 #include <cstddef>
 #include <memory>
@@ -256,7 +257,8 @@ std::string WriteJson(const Json::Value& value) {
     // Not one builder for all threads: it is cheap, and writing through a shared one is not promised to be safe.
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
-    return Json::writeString(builder, value);
+    // The library escapes every control byte but DEL, which can stand in a text only.
+    return boost::replace_all_copy(Json::writeString(builder, value), "\x7F", "\\u007f");
 }
 
 }  // namespace appliance

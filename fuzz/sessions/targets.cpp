@@ -74,7 +74,8 @@ void DoorMarks(std::string_view input) {
 }  // namespace
 
 const std::vector<ServerTarget>& ServerTargets() {
-    static const std::vector<ServerTarget> targets = {{"SessionFile", SessionFile}, {"DoorMarks", DoorMarks}};
+    static const std::vector<ServerTarget> targets = {
+        {"SessionFile", SessionFile}, {"DoorMarks", DoorMarks}, {"ConfFile", RunConfFile}};
     return targets;
 }
 

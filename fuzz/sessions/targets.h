@@ -21,6 +21,10 @@ public:
     using std::runtime_error::runtime_error;
 };
 
+// A configuration file and what is done with it, by way of the contract's operations. The input's first byte is the size of
+// a buffer; a key, a section, a value and the file follow, with a NUL behind each of the first three.
+void RunConfFile(std::string_view input);
+
 const std::vector<ServerTarget>& ServerTargets();
 
 // Throws std::out_of_range when there is no such target.

@@ -16,7 +16,20 @@ namespace appliance {
 
 // Its parent ends at once, so that nobody has to collect it.
 void StartVornwin(const char* option) {
-    const std::string program = Path(kVornwin);
+    std::string program = Path(kVornwin);
+    std::string word = option;
+    // Nothing of the server's own environment, as with a background task.
+    std::string path = "PATH=/usr/sbin:/usr/bin:/sbin:/bin";
+    std::string home = "HOME=/";
+    std::string language = "LC_ALL=C";
+    std::string root = Path("");
+    char* underRoot = nullptr;
+    if (!root.empty()) {
+        root.insert(0, std::string(kRootVariable) + "=");
+        underRoot = root.data();
+    }
+    char* const arguments[] = {program.data(), word.data(), nullptr};
+    char* const environment[] = {path.data(), home.data(), language.data(), underRoot, nullptr};
     const pid_t pid = fork();
     if (pid < 0) {
         Log(LOG_ERR, program + " " + option + " can't be started: " + strerror(errno));
@@ -36,7 +49,7 @@ void StartVornwin(const char* option) {
         sigset_t none;
         sigemptyset(&none);
         sigprocmask(SIG_SETMASK, &none, nullptr);
-        execl(program.c_str(), program.c_str(), option, static_cast<char*>(nullptr));
+        execve(arguments[0], arguments, environment);
         _exit(127);
     }
     while (waitpid(pid, nullptr, 0) < 0 && errno == EINTR) {

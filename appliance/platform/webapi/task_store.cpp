@@ -172,9 +172,11 @@ void TaskStore::RemoveOld() {
 std::vector<std::string> TaskStore::List(std::string_view prefix, std::string_view group) {
     EndDead();
     std::vector<std::string> ids;
-    Statement select(database_,
-                     "SELECT id FROM tasks WHERE task_group=?1 AND substr(id,1,length(?2))=?2 ORDER BY number");
-    select.Bind(1, group).Bind(2, prefix);
+    Statement select(
+        database_,
+        "SELECT id FROM tasks WHERE task_group=?1 AND substr(id,1,length(?2))=?2 AND (state<>?3 OR ended>=?4) "
+        "ORDER BY number");
+    select.Bind(1, group).Bind(2, prefix).Bind(3, Number(TaskState::Ended)).Bind(4, Now() - kEndedTasksAge);
     while (select.Step()) {
         ids.push_back(select.Text(0));
     }
@@ -188,8 +190,8 @@ std::optional<TaskRecord> TaskStore::Find(std::string_view id) {
     EndDead();
     Statement select(database_,
                      "SELECT id, task_group, prefix, removed_when_read, module, symbol, parameters, state, pid, start, "
-                     "boot, success, data, code, errors FROM tasks WHERE id=?");
-    select.Bind(1, id);
+                     "boot, success, data, code, errors FROM tasks WHERE id=? AND (state<>? OR ended>=?)");
+    select.Bind(1, id).Bind(2, Number(TaskState::Ended)).Bind(3, Now() - kEndedTasksAge);
     if (!select.Step()) {
         return std::nullopt;
     }

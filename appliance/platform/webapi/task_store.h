@@ -97,7 +97,8 @@ private:
     Database database_;
 };
 
-// How many ended tasks are kept for each prefix, and for how long (seconds).
+// How many ended tasks are kept for each prefix, and for how long (seconds). Older ones are not found any more, and go with
+// the next new task.
 inline constexpr int kEndedTasksKept = 32;
 inline constexpr int kEndedTasksAge = 7 * 24 * 60 * 60;
 

@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <cctype>
 #include <map>
 #include <random>
 #include <string>
@@ -10,120 +9,19 @@
 #include <vector>
 
 #include "appliance/base/conf_file.h"
+#include "tests/appliance/base/conf_model.h"
 
 using appliance::ConfFile;
+using conf_model::Content;
+using conf_model::Folded;
+using conf_model::IsWith;
+using conf_model::Model;
+using conf_model::Others;
+using conf_model::Sections;
 
 namespace {
 
 using Random = std::mt19937;
-using Sections = std::map<std::string, std::map<std::string, std::string>>;
-
-// Letters without blanks, in lower case.
-std::string Folded(const std::string& text) {
-    std::string folded;
-    for (const char letter : text) {
-        const auto byte = static_cast<unsigned char>(letter);
-        if (byte > 0x7F || std::isspace(byte) == 0) {
-            folded += byte > 0x7F ? letter : static_cast<char>(std::tolower(byte));
-        }
-    }
-    return folded;
-}
-
-std::string Stripped(const std::string& text) {
-    std::size_t begin = 0;
-    std::size_t end = text.size();
-    const auto isBlank = [&](std::size_t at) {
-        const auto byte = static_cast<unsigned char>(text[at]);
-        return byte <= 0x7F && std::isspace(byte) != 0;
-    };
-    while (begin < end && isBlank(begin)) {
-        ++begin;
-    }
-    while (end > begin && isBlank(end - 1)) {
-        --end;
-    }
-    return text.substr(begin, end - begin);
-}
-
-// Puts two pieces of a line together: blanks where they meet become one.
-void Join(std::string& whole, const std::string& piece) {
-    const std::string marked = "|" + whole;
-    const bool gap = Stripped(marked) != marked || Stripped(piece + "|") != piece + "|";
-    const std::string left = Stripped(marked).substr(1);
-    const std::string right = Stripped(piece + "|");
-    whole = left + (gap && !left.empty() ? " " : "") + right.substr(0, right.size() - 1);
-}
-
-// One line with its continuations, and to what it belongs; `key` is folded and empty for all that is no key.
-struct ModelLine {
-    std::string raw;
-    std::string section;
-    std::string key;
-    std::string value;
-};
-
-std::vector<ModelLine> Model(const std::string& text) {
-    std::vector<std::string> physical;
-    for (std::size_t begin = 0; begin < text.size();) {
-        std::size_t end = text.find('\n', begin);
-        end = end == std::string::npos ? text.size() : end + 1;
-        physical.push_back(text.substr(begin, end - begin));
-        begin = end;
-    }
-    std::vector<ModelLine> lines;
-    std::string section = "global";
-    for (std::size_t i = 0; i < physical.size(); ++i) {
-        ModelLine line;
-        line.raw = physical[i];
-        const std::string first = Stripped(physical[i]);
-        const char mark = first.empty() ? '\0' : first[0];
-        if (!first.empty() && mark != '#' && mark != ';') {
-            std::string whole;
-            bool continues = true;
-            while (continues) {
-                std::string piece = physical[i];
-                const std::string stripped = Stripped(piece);
-                continues = piece.back() == '\n' && !stripped.empty() && stripped.back() == '\\';
-                if (continues) {
-                    piece.erase(piece.rfind('\\'));
-                }
-                Join(whole, piece);
-                if (continues && i + 1 == physical.size()) {
-                    break;
-                }
-                if (continues) {
-                    line.raw += physical[++i];
-                }
-            }
-            whole = Stripped(whole);
-            const std::size_t sign = whole.find('=');
-            if (mark == '[') {
-                const std::size_t close = whole.find(']');
-                if (close != std::string::npos) {
-                    section = Folded(whole.substr(1, close - 1));
-                }
-            } else if (sign != std::string::npos) {
-                line.key = Folded(whole.substr(0, sign));
-                line.value = Stripped(whole.substr(sign + 1));
-            }
-        }
-        line.section = section;
-        lines.push_back(line);
-    }
-    return lines;
-}
-
-Sections Content(const std::vector<ModelLine>& lines) {
-    Sections sections;
-    for (const ModelLine& line : lines) {
-        if (!line.key.empty()) {
-            sections[line.section][line.key] = line.value;
-        }
-    }
-    return sections;
-}
-
 // The content as the file's own reader gives it.
 Sections Read(const ConfFile& file) {
     Sections sections;
@@ -133,17 +31,6 @@ Sections Read(const ConfFile& file) {
         }
     }
     return sections;
-}
-
-// All bytes that do not belong to a key.
-std::string Others(const std::string& text, const std::string& section, const std::string& key) {
-    std::string others;
-    for (const ModelLine& line : Model(text)) {
-        if (line.section != section || line.key != key) {
-            others += line.raw;
-        }
-    }
-    return others;
 }
 
 std::string Pick(Random& random, const std::vector<std::string>& from) {
@@ -175,19 +62,6 @@ std::string RandomText(Random& random) {
         }
     }
     return text;
-}
-
-// Is `text` the other one, or that with `added` put in somewhere?
-bool IsWith(const std::string& text, const std::string& other, const std::string& added) {
-    if (text == other) {
-        return true;
-    }
-    for (std::size_t at = text.find(added); at != std::string::npos; at = text.find(added, at + 1)) {
-        if (text.substr(0, at) + text.substr(at + added.size()) == other) {
-            return true;
-        }
-    }
-    return false;
 }
 
 constexpr unsigned kSeed = 20240611;
@@ -291,19 +165,35 @@ TEST(ConfFileFuzz, SectionsAreHeldAsGiven) {
 
 TEST(ConfFileFuzz, AnyBytesAtAll) {
     Random random(kSeed + 4);
+    int set = 0;
     for (int turn = 0; turn < kTurns; ++turn) {
         std::string text;
         const auto length = random() % 60;
         for (unsigned i = 0; i < length; ++i) {
             text += random() % 3 == 0 ? static_cast<char>(random() % 256) : "=\n\\[] #a"[random() % 8];
         }
+        const std::string shown = testing::PrintToString(text);
+        const Sections content = Content(Model(text));
+        ASSERT_EQ(Read(ConfFile(text)), content) << shown;
         ConfFile file(text);
-        Read(file);
-        file.Set("global", "a", "1");
-        file.SetSection("x", {{"a", "1"}}, "%s=%s\n");
         file.Remove("global", "a");
-        EXPECT_FALSE(file.Get("global", "a").has_value()) << testing::PrintToString(text);
+        ASSERT_EQ(file.text(), Others(text, "global", "a")) << shown;
+        file = ConfFile(text);
+        if (file.Set("x", "a", "1")) {
+            ++set;
+            Sections expected = content;
+            expected["x"]["a"] = "1";
+            ASSERT_EQ(Content(Model(file.text())), expected) << shown;
+        }
+        file = ConfFile(text);
+        if (file.SetSection("x", {{"a", "1"}}, "%s=%s\n")) {
+            ++set;
+            Sections expected = content;
+            expected["x"] = {{"a", "1"}};
+            ASSERT_EQ(Content(Model(file.text())), expected) << shown;
+        }
     }
+    EXPECT_GT(set, kTurns);
 }
 
 }  // namespace

@@ -7,7 +7,9 @@
 #include <unistd.h>
 
 #include <filesystem>
+#include <functional>
 #include <set>
+#include <vector>
 
 #include "appliance/base/file.h"
 #include "tests/appliance/core/core_test.h"
@@ -97,6 +99,58 @@ TEST_F(FilesTest, TouchFollowsNoLinkAndTakesNoForeignFile) {
     EXPECT_NE(VLIBCErrGet(), 0);
     EXPECT_FAILS(VLIBCFileTouch((folder / "none/file").c_str()), -1, FileWrite);
     EXPECT_FAILS(VLIBCFileTouch(nullptr), -1, BadArgument);
+}
+
+// Where everybody may make files, as in /tmp, no other user can keep the appliance from its own.
+TEST_F(FilesTest, TouchReplacesWhatAnotherUserPutIntoASharedFolder) {
+    ASSERT_EQ(chmod(folder.path().c_str(), 01777), 0);
+    Put(folder / "victim", "text");
+    const timespec old[2] = {{1000, 0}, {1000, 0}};
+    ASSERT_EQ(utimensat(AT_FDCWD, (folder / "victim").c_str(), old, 0), 0);
+    const std::vector<std::function<int()>> makers = {
+        [&] {
+            Put(path, "foreign");
+            return 0;
+        },
+        [&] { return symlink("victim", path.c_str()); },
+        [&] { return symlink("nothing", path.c_str()); },
+        [&] { return mkfifo(path.c_str(), 0666); },
+    };
+    for (const auto& make : makers) {
+        ASSERT_EQ(make(), 0);
+        ASSERT_EQ(lchown(path.c_str(), 1, 1), 0);
+        EXPECT_SUCCEEDS(VLIBCFileTouch(path.c_str()), 0);
+        EXPECT_EQ(Got(path), "");
+        EXPECT_EQ(StatOf(path).st_mode, static_cast<mode_t>(S_IFREG | 0644));
+        EXPECT_EQ(StatOf(path).st_uid, 0U);
+        EXPECT_THAT(folder.Names(), ElementsAre("file", "victim"));
+        ASSERT_EQ(unlink(path.c_str()), 0);
+    }
+    EXPECT_EQ(Got(folder / "victim"), "text");
+    EXPECT_EQ(StatOf(folder / "victim").st_mtime, 1000);
+}
+
+TEST_F(FilesTest, TouchPutsAnotherUsersFolderAside) {
+    ASSERT_EQ(chmod(folder.path().c_str(), 01777), 0);
+    std::filesystem::create_directory(path);
+    Put(path + "/kept", "text");
+    ASSERT_EQ(chown(path.c_str(), 1, 1), 0);
+    EXPECT_SUCCEEDS(VLIBCFileTouch(path.c_str()), 0);
+    EXPECT_EQ(Got(path), "");
+    ASSERT_EQ(folder.Names().size(), 2U);
+    const std::string aside = folder / folder.Names()[1];
+    EXPECT_EQ(Got(aside + "/kept"), "text");
+    EXPECT_EQ(StatOf(aside).st_uid, 1U);
+}
+
+// What the appliance's own user has put there is for an administrator to look at.
+TEST_F(FilesTest, TouchLeavesTheOwnUsersThingsInASharedFolder) {
+    ASSERT_EQ(chmod(folder.path().c_str(), 01777), 0);
+    ASSERT_EQ(symlink("target", path.c_str()), 0);
+    EXPECT_FAILS(VLIBCFileTouch(path.c_str()), -1, FileWrite);
+    std::filesystem::create_directory(folder / "folder");
+    EXPECT_FAILS(VLIBCFileTouch((folder / "folder").c_str()), -1, FileWrite);
+    EXPECT_THAT(folder.Names(), ElementsAre("file", "folder"));
 }
 
 TEST_F(FilesTest, RenameReplacesTheTarget) {

@@ -14,7 +14,6 @@
 #include <csignal>
 #include <filesystem>
 #include <random>
-#include <set>
 
 #include "appliance/base/command.h"
 #include "appliance/base/file.h"
@@ -186,30 +185,6 @@ TEST_F(SectionWriterTest, FullDisk) {
         FAIL() << "no mount namespace here";
     }
     EXPECT_EQ(done, 0);
-}
-
-TEST_F(SectionWriterTest, KilledAtEachCall) {
-    const std::string old = "[global]\n    a=old\n    kept=" + std::string(9000, 'k') + "\n";
-    std::set<std::string> contents;
-    bool killed = true;
-    for (int calls = 0; killed && calls < 2000; ++calls) {
-        Put(path, old);
-        killed = appliance_test::KilledAtCall(calls, [&] {
-            Hash hash;
-            VLIBCFileGetSection(path.c_str(), "global", hash.address());
-            VLIBCSzHashSetValue(hash.address(), "a", "new");
-            char name[4095] = {};
-            return VLIBCFileITmpName(path.c_str(), name, sizeof(name)) == 0 && Write(name, hash) == 1 &&
-                   VLIBCSysRename(name, path.c_str()) == 0;
-        });
-        contents.insert(Got(path));
-        appliance::RemoveStaleTemporaries(folder.path());
-        ASSERT_THAT(folder.Names(), ElementsAre("smbinfo.conf"));
-    }
-    EXPECT_FALSE(killed);
-    std::string fresh = old;
-    fresh.replace(fresh.find("old"), 3, "new");
-    EXPECT_EQ(contents, (std::set<std::string>{old, fresh}));
 }
 
 TEST_F(SectionWriterTest, OnTheDiskBeforeItIsPutInPlace) {

@@ -40,6 +40,10 @@ TEST_F(ValuesTest, IncludesAreNotFollowed) {
     Put(folder / "other.conf", "[global]\nrealm = OTHER\n");
     Put(path, "[global]\ninclude = " + folder / "other.conf" + "\n");
     EXPECT_EQ(Value("realm"), "<0>");
+    Hash hash;
+    EXPECT_SUCCEEDS(VLIBCFileGetSection(path.c_str(), "global", hash.address()), 0);
+    EXPECT_EQ(hash.Value("realm"), "<none>");
+    EXPECT_EQ(hash.Value("include"), folder / "other.conf");
 }
 
 TEST_F(ValuesTest, CutToTheBuffer) {

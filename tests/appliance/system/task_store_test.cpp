@@ -2,15 +2,12 @@
 
 #include "appliance/platform/system/task_store.h"
 
-#include <signal.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <chrono>
 #include <filesystem>
-#include <random>
 #include <set>
 #include <string>
 #include <thread>
@@ -153,32 +150,6 @@ TEST_F(TaskStore, MakesNoTableWithoutTasks) {
     Put(appliance::kCronTable, "* * * * * root /bin/left\n");
     ASSERT_FALSE(appliance::RepairCronTable());
     EXPECT_FALSE(Content(appliance::kCronTable));
-}
-
-TEST_F(TaskStore, SurvivesAKillAtAnyMoment) {
-    ScheduledTask task = Task("/bin/true", 0);
-    ASSERT_FALSE(appliance::SaveTask(task));
-    std::mt19937 random(7);
-    int apart = 0;
-    for (int round = 0; round < 60; ++round) {
-        const pid_t child = system_test::StartChild([task]() mutable {
-            for (int hour = 0;; ++hour) {
-                task.schedule.hour = hour % 24;
-                static_cast<void>(appliance::SaveTask(task));
-            }
-        });
-        std::this_thread::sleep_for(std::chrono::microseconds(std::uniform_int_distribution<>(1000, 12000)(random)));
-        ASSERT_EQ(kill(child, SIGKILL), 0);
-        system_test::EndOf(child);
-        ASSERT_EQ(Tasks().size(), 1U);
-        ASSERT_EQ(Tasks()[0].command, "/bin/true");
-        TaskFile file;
-        ASSERT_EQ(appliance::ParseTasks(*Content(appliance::kSchedule), file), "");
-        apart += *Content(appliance::kCronTable) != appliance::CronTable(file, appliance::Today()) ? 1 : 0;
-        ASSERT_FALSE(appliance::RepairCronTable());
-        ExpectTogether();
-    }
-    RecordProperty("killed_between_the_writes", apart);
 }
 
 TEST_F(TaskStore, LosesNothingWhenManySaveAtOnce) {

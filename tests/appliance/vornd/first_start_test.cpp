@@ -10,8 +10,10 @@
 #include <cerrno>
 #include <cstdio>
 #include <filesystem>
+#include <optional>
 
 #include "appliance/base/file.h"
+#include "appliance/base/file_lock.h"
 #include "tests/appliance/vornd/support.h"
 
 namespace vornd_test {
@@ -45,6 +47,10 @@ TEST(CommandLineTest, WrongOnesEndWithOneLine) {
     EXPECT_EQ(Refusal(tree, {"--foreground=1"}, 2), "vornd: option \"--foreground=1\" is unknown or wrong; try --help");
     EXPECT_EQ(Refusal(tree, {"--socket"}, 2), "vornd: option \"--socket\" needs a value");
     EXPECT_EQ(Refusal(tree, {"--socket", ""}, 2), "vornd: option \"--socket\" needs a value");
+    for (const char* seconds : {"-1", "1x", "x", "301", "99999999999999999999"}) {
+        EXPECT_EQ(Refusal(tree, {"--drain", seconds}, 2),
+                  "vornd: option \"--drain\" takes a number of seconds up to 300");
+    }
     EXPECT_EQ(Refusal(tree, {"start"}, 2), "vornd: \"start\" is one argument too many; try --help");
 }
 
@@ -70,6 +76,29 @@ TEST(FirstStartTest, MakesWhatIsMissing) {
     EXPECT_EQ(ModeOf(tree.At("/var/lib/vorn/tasks.db")), 0600u);
     EXPECT_EQ(ModeOf(tree.At("/run/vorn")), 0755u);
     EXPECT_EQ(ModeOf(tree.Socket()), 0666u);
+}
+
+// A writer of the settings may be at work before there is a file.
+TEST(FirstStartTest, TheSettingsAreMadeUnderTheirLock) {
+    Tree tree;
+    std::optional<appliance::FileLock> lock =
+        appliance::FileLock::Take(tree.At("/etc/vorninfo.conf.lock"), milliseconds(0));
+    ASSERT_TRUE(lock);
+    {
+        Server server(tree, {}, false);
+        ASSERT_TRUE(Eventually([&] { return fs::exists(tree.At("/usr/vorn/etc/smb.conf")); }));
+        EXPECT_FALSE(server.Hears("READY=1", milliseconds(1000)));
+        EXPECT_FALSE(fs::exists(tree.At("/etc/vorninfo.conf")));
+        tree.Write("/etc/vorninfo.conf", "trustdomain=no\n");
+        lock.reset();
+        EXPECT_TRUE(server.Hears("READY=1"));
+        EXPECT_EQ(tree.Read("/etc/vorninfo.conf"), "trustdomain=no\n");
+    }
+    fs::remove(tree.At("/etc/vorninfo.conf"));
+    lock = appliance::FileLock::Take(tree.At("/etc/vorninfo.conf.lock"), milliseconds(0));
+    ASSERT_TRUE(lock);
+    EXPECT_EQ(Refusal(tree), "vornd: " + tree.At("/etc/vorninfo.conf") +
+                                 " can't be made: its lock can't be had: Resource temporarily unavailable");
 }
 
 TEST(FirstStartTest, KeepsWhatIsThere) {

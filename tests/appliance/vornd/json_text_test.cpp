@@ -112,8 +112,10 @@ TEST(JsonTextTest, RefusesWhatIsNoObject) {
 
 TEST(JsonTextTest, WritesOneLineOfAscii) {
     Json::Value value(Json::objectValue);
-    value["text"] = "a\n\xC3\xA9\xFF";
+    value["text"] = "a\n\xC3\xA9\xFF\x7F";
+    value["\x7F"] = 1;
     const std::string text = WriteJson(value);
+    EXPECT_EQ(text, R"({"text":"a\n\u00e9\ufffd\u007f","\u007f":1})");
     for (const char letter : text) {
         EXPECT_TRUE(letter >= ' ' && letter < '\x7F');
     }

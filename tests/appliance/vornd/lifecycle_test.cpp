@@ -13,6 +13,7 @@ namespace vornd_test {
 namespace {
 
 using ::testing::HasSubstr;
+using ::testing::Not;
 
 std::string SleepText(const Tree& tree, int milliseconds) {
     return PostText("sleep", "{\"milliseconds\": " + std::to_string(milliseconds) + ", \"file\": \"" +
@@ -66,6 +67,31 @@ TEST(LifecycleTest, RunningCallsAreAnsweredAndWaitingOnesRefused) {
         EXPECT_EQ(answer.header.at("connection"), "close");
     }
     EXPECT_EQ(server.End(), 0);
+}
+
+TEST(LifecycleTest, CallsThatDoNotEndAreLeftBehind) {
+    Tree tree;
+    {
+        Server server(tree, {"--drain", "1"});
+        std::vector<Client> running;
+        for (int index = 0; index < 2; ++index) {
+            running.push_back(server.Connect());
+            running.back().Send(SleepText(tree, 600000));
+        }
+        ASSERT_TRUE(Eventually([&] { return PidsIn(tree.At("/tmp/running")).size() == 2; }));
+        const auto begin = std::chrono::steady_clock::now();
+        server.Signal(SIGTERM);
+        EXPECT_EQ(server.End(), 1);
+        EXPECT_GE(std::chrono::steady_clock::now() - begin, milliseconds(1000)) << "they had their time";
+        EXPECT_THAT(server.Errors(), HasSubstr(": 2 calls did not end and are left behind\n"));
+        EXPECT_THAT(server.Errors(), Not(HasSubstr("]: ended\n")));
+        for (Client& client : running) {
+            EXPECT_TRUE(client.Ends());
+        }
+        EXPECT_FALSE(std::filesystem::exists(tree.Socket()));
+    }
+    Server next(tree);
+    EXPECT_EQ(next.Call("nothing").status, 200);
 }
 
 TEST(LifecycleTest, ASecondServerEndsWithOneLine) {

@@ -38,7 +38,7 @@ TEST_F(ModulesTest, LoadsOneThatIsRight) {
     const auto module = Module::Load(good_, reason);
     ASSERT_TRUE(module) << reason;
     EXPECT_EQ(module->path(), good_);
-    EXPECT_EQ(module->entries().size(), 13u);
+    EXPECT_EQ(module->entries().size(), 14u);
     EXPECT_NE(module->FindTask("TaskSteps"), nullptr);
     EXPECT_EQ(module->FindTask("TaskNobody"), nullptr);
 }

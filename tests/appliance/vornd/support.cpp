@@ -211,17 +211,23 @@ std::string PostText(const std::string& method, const std::string& body, const s
            "Content-Type: application/json\r\nContent-Length: " + std::to_string(body.size()) + "\r\n\r\n" + body;
 }
 
-Server::Server(const Tree& tree, std::vector<std::string> arguments, bool wait) : socket_(tree.Socket()) {
+Server::Server(const Tree& tree, std::vector<std::string> arguments, bool wait, const Output& output)
+    : socket_(tree.Socket()), errors_(output.file), ownErrors_(output.file.empty()) {
     static int servers = 0;
     const std::string own = tree.root() + "." + std::to_string(++servers);
-    errors_ = own + ".err";
+    if (ownErrors_) {
+        errors_ = own + ".err";
+    }
     notifyPath_ = own + ".notify";
     notify_.Reset(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     const sockaddr_un address = AddressOf(notifyPath_);
     if (bind(notify_.get(), Plain(address), sizeof address) != 0) {
         throw std::runtime_error("no notify socket");
     }
-    arguments.insert(arguments.begin(), {VORN_TEST_VORND, "--foreground", "--root", tree.root()});
+    if (output.foreground) {
+        arguments.insert(arguments.begin(), "--foreground");
+    }
+    arguments.insert(arguments.begin(), {VORN_TEST_VORND, "--root", tree.root()});
     std::vector<char*> argv;
     for (std::string& argument : arguments) {
         argv.push_back(argument.data());
@@ -233,7 +239,8 @@ Server::Server(const Tree& tree, std::vector<std::string> arguments, bool wait) 
     char* environment[] = {path.data(), notify.data(), watchdog.data(), nullptr};
     posix_spawn_file_actions_t actions;
     posix_spawn_file_actions_init(&actions);
-    posix_spawn_file_actions_addopen(&actions, 2, errors_.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0600);
+    posix_spawn_file_actions_addopen(&actions, 2, errors_.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_NOCTTY,
+                                     0600);
     const int failed = posix_spawn(&pid_, argv[0], &actions, nullptr, argv.data(), environment);
     posix_spawn_file_actions_destroy(&actions);
     if (failed != 0) {
@@ -249,7 +256,9 @@ Server::~Server() {
         kill(pid_, SIGKILL);
         End();
     }
-    unlink(errors_.c_str());
+    if (ownErrors_) {
+        unlink(errors_.c_str());
+    }
     unlink(notifyPath_.c_str());
 }
 

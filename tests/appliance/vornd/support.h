@@ -83,10 +83,17 @@ private:
 std::string PostText(const std::string& method, const std::string& body, const std::string& version = "1",
                      const std::string& api = "Test.Plain", const std::string& header = {});
 
+// Where vornd's standard error leads.
+struct Output {
+    bool foreground = true;  // with the option --foreground
+    std::string file;        // empty: one of the server's own
+};
+
 // A process of vornd on a tree, as a service manager would start it.
 class Server {
 public:
-    explicit Server(const Tree& tree, std::vector<std::string> arguments = {}, bool wait = true);
+    explicit Server(const Tree& tree, std::vector<std::string> arguments = {}, bool wait = true,
+                    const Output& output = {});
     ~Server();
     Server(const Server&) = delete;
     Server& operator=(const Server&) = delete;
@@ -110,6 +117,7 @@ public:
 private:
     std::string socket_;
     std::string errors_;
+    bool ownErrors_;
     appliance::FileDescriptor notify_;
     std::string notifyPath_;
     pid_t pid_ = -1;

@@ -9,6 +9,7 @@
 #include <fstream>
 #include <iterator>
 #include <thread>
+#include <utility>
 
 #include "appliance/platform/webapi/exchange.h"
 #include "appliance/platform/webapi/task_process.h"
@@ -138,6 +139,14 @@ TEST_F(PollingTest, FailsWithoutAResult) {
     ExpectFailure(EndOf(Start("TaskThrow")), 123);
     ExpectFailure(EndOf(Start("TaskSilent")), 120);
     ExpectFailure(EndOf(Start("TaskExit")), 120);
+}
+
+TEST_F(PollingTest, FailsWhenAnExceptionOfNoStandardTypeLeavesIt) {
+    const std::string path = tree_.At("/usr/vorn/lib/modules/throwing_module.so");
+    std::filesystem::copy_file(VORN_THROWING_MODULE, path);
+    dlclose(std::exchange(module_, dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL)));
+    ASSERT_NE(module_, nullptr) << dlerror();
+    ExpectFailure(EndOf(Start("TaskThrowNumber")), 123);
 }
 
 TEST_F(PollingTest, FailsWhenItsProcessIsKilled) {

@@ -253,9 +253,28 @@ TEST_F(TaskStoreTest, EndedRecordsGoWithTheirAge) {
     const std::string running = Running();
     Database(path_, Database::Mode::ReadWrite)
         .Execute("UPDATE tasks SET ended=ended-" + std::to_string(kEndedTasksAge + 10) + " WHERE ended>0");
-    Add();
+    const auto kept = [&] {
+        Database database(path_, Database::Mode::ReadWrite);
+        Statement count(database, "SELECT count(*) FROM tasks");
+        count.Step();
+        return count.Number(0);
+    };
+    // Nobody finds it, also while no new task comes.
     EXPECT_FALSE(store_.Find(old));
     EXPECT_TRUE(store_.Find(running));
+    EXPECT_THAT(store_.List("Test", "admin"), ElementsAre(running));
+    EXPECT_EQ(kept(), 2);
+    Add();
+    EXPECT_EQ(kept(), 2);
+}
+
+TEST_F(TaskStoreTest, EndedRecordsAreFoundUntilThen) {
+    const std::string id = Running();
+    store_.End(id, Success(Json::Value()));
+    Database(path_, Database::Mode::ReadWrite)
+        .Execute("UPDATE tasks SET ended=ended-" + std::to_string(kEndedTasksAge - 60));
+    EXPECT_TRUE(store_.Find(id));
+    EXPECT_THAT(store_.List("Test", "admin"), ElementsAre(id));
 }
 
 TEST_F(TaskStoreTest, ReadersNeverSeeHalfAnEnd) {

@@ -3,6 +3,7 @@
 #include <signal.h>
 #include <stdlib.h>
 #include <sys/syscall.h>
+#include <syslog.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -84,6 +85,12 @@ void Silent(VORN::APIRequest*, VORN::APIResponse*) {}
 void Fail(VORN::APIRequest*, VORN::APIResponse* response) {
     response->SetSuccess(Json::Value("replaced"));
     response->SetError(2607, Number("detail", 7));
+}
+
+// As the module of the appliance logs.
+void LogLine(VORN::APIRequest* request, VORN::APIResponse* response) {
+    syslog(LOG_ERR, "%s", request->GetParam("line", "").asString().c_str());
+    response->SetSuccess(Json::Value());
 }
 
 // The descriptors that a program would inherit that this process starts.
@@ -209,6 +216,7 @@ const VORN::APIEntry gTable[] = {
     {kApi, 1, "silent", Silent},
     {kApi, 1, "fail", Fail},
     {kApi, 1, "inherited", Inherited},
+    {kApi, 1, "log", LogLine},
     {kApi, 1, "start", Start},
     {kApi, 1, "status", Status},
     {kApi, 1, "stop", Stop},
