@@ -8,6 +8,7 @@
 #include <system_error>
 #include <utility>
 
+#include "appliance/base/file.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/text.h"
@@ -97,6 +98,10 @@ Json::Value Leave(const Parameters& parameters) {
     }
     const JobResult result = RunJoinTool(request);
     if (!result.success) {
+        // The answer says it all; the file is for the module whose call reads it.
+        if (const std::error_code error = RemoveFile(Path(kJoinStatus))) {
+            Log(LOG_WARNING, Path(kJoinStatus) + ": " + error.message());
+        }
         throw CallFailure(CodeOfStatus(result.status.message), "the leave failed: " + result.status.message);
     }
     RecordLeave();

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "appliance/platform/system/event_text.h"
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {
@@ -16,8 +17,12 @@ struct EventOptions {
     int limit = kPage;
 };
 
+std::string KindText(const Json::Value& kind) {
+    return kind.isInt() ? EventKindName(kind.asInt()) : "-";
+}
+
 std::string LevelText(const Json::Value& level) {
-    return level == Json::Value(1) ? "information" : "level " + JsonLine(level);
+    return level.isInt() ? EventLevelName(level.asInt()) : "-";
 }
 
 std::string CodeText(const Json::Value& code) {
@@ -38,11 +43,11 @@ int RunEvents(Context& context, const EventOptions& options) {
     }
     std::vector<std::vector<std::string>> rows;
     for (const Json::Value& event : ListOf(answer.data, "events")) {
-        rows.push_back({TimeText(MemberOf(event, "time")), LevelText(MemberOf(event, "level")),
-                        CodeText(MemberOf(event, "code")), TextOf(event, "text")});
+        rows.push_back({TimeText(MemberOf(event, "time")), KindText(MemberOf(event, "kind")),
+                        LevelText(MemberOf(event, "level")), CodeText(MemberOf(event, "code")), TextOf(event, "text")});
     }
     if (!rows.empty()) {
-        context.out.Table({"TIME", "LEVEL", "CODE", "EVENT"}, rows);
+        context.out.Table({"TIME", "KIND", "LEVEL", "CODE", "EVENT"}, rows);
     }
     context.err.Line(std::to_string(rows.size()) + " of " + std::to_string(NumberOf(answer.data, "total")) +
                      " events.");

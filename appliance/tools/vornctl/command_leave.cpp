@@ -24,16 +24,17 @@ std::string DomainToLeave(const Context& context) {
     return TextOf(context.client.Call(methods::Get()).data, "domain_name");
 }
 
-// "The appliance's computer account NAS1$"; without the name when the appliance does not tell it.
+// "The appliance's computer account NAS1$"; without the name when the appliance does not tell it. After the leave it
+// would not know it any more.
 std::string AccountText(const Context& context) {
     Json::Value overview;
     context.client.TryCall(methods::Overview(), Json::Value(Json::objectValue), overview);
     const std::string account = TextOf(overview, "computer_account");
-    return "The appliance's computer account" + (account.empty() ? "" : " " + Escape(account));
+    return "The appliance's computer account" + (account.empty() ? "" : " " + account);
 }
 
 // True when the administrator wants it.
-bool Confirm(Context& context, const LeaveOptions& options, const std::string& domain) {
+bool Confirm(Context& context, const LeaveOptions& options, const std::string& domain, const std::string& account) {
     if (options.yes) {
         return true;
     }
@@ -50,8 +51,8 @@ bool Confirm(Context& context, const LeaveOptions& options, const std::string& d
             "The appliance leaves the domain " + Escape(domain) + ". Its users lose their access to the shares.");
     }
     err.Paragraph("", 0,
-                  AccountText(context) + (options.deleteAccount ? " is deleted on the domain controller."
-                                                                : " stays on the domain controller."));
+                  Escape(account) + (options.deleteAccount ? " is deleted on the domain controller."
+                                                           : " stays on the domain controller."));
     const std::string answer = Ask("Leave? [y/N] ");
     return answer == "y" || answer == "yes";
 }
@@ -67,19 +68,31 @@ Answer RunCall(LiveSteps& steps, const LeaveOptions& options, const Secret& pass
     return steps.Run(methods::Leave(), request, &password);
 }
 
-// What stays behind, as the appliance names it.
-void SayWhatStays(Output& out, const LeaveOptions& options, const std::string& domain, const LiveSteps& steps) {
-    bool named = false;
+// What stays behind, as the appliance names it. The record of a leave that is over names the computer account unless it
+// is gone; without such a record it is taken to stay.
+std::vector<std::string> WhatStays(const LeaveOptions& options, const std::string& domain, const std::string& account,
+                                   const LiveSteps& steps) {
+    std::vector<std::string> notes;
     for (const Json::Value& leftover : ListOf(steps.record(), "leftovers")) {
         if (leftover.isString()) {
-            out.Paragraph("  Note:", kIndent, Escape(leftover.asString()));
-            named = true;
+            notes.push_back(leftover.asString());
         }
     }
-    if (!named && !options.deleteAccount && !domain.empty()) {
-        out.Paragraph("  Note:", kIndent,
-                      "The appliance's computer account stays in the domain " + Escape(domain) + ".");
+    const bool recorded = !notes.empty() || !MemberOf(steps.record(), "finished").isNull();
+    if (!recorded && !options.deleteAccount && !domain.empty()) {
+        notes.push_back(account + " stays in the domain " + domain + ".");
     }
+    return notes;
+}
+
+// The answer, whose data are null, with what stays behind in their place.
+void PrintAsJson(Context& context, Answer answer, const std::vector<std::string>& notes) {
+    if (!notes.empty() && answer.data.isNull()) {
+        for (const std::string& note : notes) {
+            answer.whole["data"]["leftovers"].append(note);
+        }
+    }
+    PrintJson(context, answer);
 }
 
 int RunLeave(Context& context, const LeaveOptions& options) {
@@ -89,8 +102,9 @@ int RunLeave(Context& context, const LeaveOptions& options) {
     if (!options.deleteAccount && (!options.user.empty() || options.passwordFromInput)) {
         throw Failure(kUsage, "--user and --password-stdin go with --delete-account: leaving alone needs no account.");
     }
-    const std::string domain = context.json && options.yes ? "" : DomainToLeave(context);
-    if (!Confirm(context, options, domain)) {
+    const std::string domain = DomainToLeave(context);
+    const std::string account = AccountText(context);
+    if (!Confirm(context, options, domain, account)) {
         throw Failure(kInterrupted, "Nothing was changed.");
     }
     Secret password;
@@ -98,13 +112,15 @@ int RunLeave(Context& context, const LeaveOptions& options) {
         password = options.passwordFromInput ? ReadPasswordFromInput()
                                              : AskPassword("Password of " + Escape(options.user) + ": ");
     }
-    LiveSteps steps(context);
+    LiveSteps steps(context, true);
     if (!context.json) {
         context.out.Line("Leaving the domain.");
     }
     const Answer answer = RunCall(steps, options, password);
+    const std::vector<std::string> notes =
+        answer.success ? WhatStays(options, domain, account, steps) : std::vector<std::string>();
     if (context.json) {
-        PrintJson(context, answer);
+        PrintAsJson(context, answer, notes);
         return answer.success ? kDone : kRefused;
     }
     if (!answer.success) {
@@ -115,7 +131,9 @@ int RunLeave(Context& context, const LeaveOptions& options) {
         return kDone;
     }
     context.out.Line(context.out.Coloured(Colour::Good, "The appliance is no member of a domain any more."));
-    SayWhatStays(context.out, options, domain, steps);
+    for (const std::string& note : notes) {
+        context.out.Paragraph("  Note:", kIndent, Escape(note));
+    }
     return kDone;
 }
 

@@ -125,8 +125,8 @@ std::string UsageText(const CLI::App& app, const CLI::ParseError& error) {
 int ReportUsage(const Program& program, Output& err, const std::string& text) {
     const auto chosen = program.app.get_subcommands();
     const std::string command = chosen.empty() ? "vornctl" : "vornctl " + chosen[0]->get_name();
-    err.Paragraph("vornctl:", 9, Escape(text));
-    err.Line("\"" + command + " --help\" tells what it takes.");
+    const std::string sentence = text.substr(0, text.find_last_not_of('.') + 1);
+    err.Line("vornctl: " + Escape(sentence) + "; \"" + command + " --help\" tells what it takes.");
     return kUsage;
 }
 
@@ -169,7 +169,7 @@ int RunCommand(Program& program, Output& out, Output& err) {
         if (failure.code() == kUsage) {
             return ReportUsage(program, err, failure.what());
         }
-        err.Paragraph("vornctl:", 9, failure.what());
+        err.Line(std::string("vornctl: ") + failure.what());
         return failure.code();
     }
 }
@@ -184,10 +184,6 @@ int Run(int count, char** words) {
     try {
         if (!forbidden.empty()) {
             return ReportUsage(program, err, forbidden);
-        }
-        if (count < 2) {
-            err.Line(Tidied(program.app.help()));
-            return kUsage;
         }
         program.app.parse(count, words);
         code = RunCommand(program, out, err);

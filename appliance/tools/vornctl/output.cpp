@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <boost/algorithm/string/replace.hpp>
 #include <cstdlib>
 #include <ctime>
 
@@ -36,7 +37,8 @@ std::string Written(const Json::Value& value, const char* indentation) {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = indentation;
     builder["emitUTF8"] = false;
-    return Json::writeString(builder, value);
+    // The library leaves DEL as it is, which is a control byte to a terminal. It can stand in a text only.
+    return boost::replace_all_copy(Json::writeString(builder, value), "\x7F", "\\u007f");
 }
 
 // Widths of the columns so that a row fits: the widest ones give way first.

@@ -39,8 +39,8 @@ void PrintStep(Output& out, const Json::Value& step) {
     }
 }
 
-LiveSteps::LiveSteps(Context& context) : context_(context) {
-    if (context_.json) {
+LiveSteps::LiveSteps(Context& context, bool alsoForJson) : context_(context) {
+    if (context_.json && !alsoForJson) {
         return;
     }
     Json::Value old;
@@ -55,6 +55,9 @@ void LiveSteps::Show() {
         return;
     }
     record_ = record;
+    if (context_.json) {
+        return;
+    }
     const Json::Value& steps = ListOf(record_, "steps");
     while (shown_ < steps.size() && !IsRunning(steps[shown_])) {
         PrintStep(context_.out, steps[shown_]);
@@ -77,7 +80,9 @@ Answer LiveSteps::Run(const Method& method, const Json::Value& parameters, const
                 kInterrupted,
                 "Interrupted. What was begun goes on in the appliance: \"vornctl steps\" shows how far it is.");
         }
-        Show();
+        if (over || !context_.json) {
+            Show();
+        }
     }
     context_.out.Transient("");
     try {

@@ -13,7 +13,8 @@ void PrintStep(Output& out, const Json::Value& step);
 // Runs "set" or "leave" and shows its steps while they happen. Made before the call begins.
 class LiveSteps {
 public:
-    explicit LiveSteps(Context& context);
+    // With --json nothing is shown, and the record is read at the end, once, if `alsoForJson` asks for it.
+    explicit LiveSteps(Context& context, bool alsoForJson = false);
 
     // Starts the call, shows the steps, and returns the answer. Throws Failure; after Ctrl-C the appliance goes on.
     Answer Run(const Method& method, const Json::Value& parameters, const Secret* password);
@@ -27,7 +28,7 @@ public:
     std::vector<std::pair<std::string, std::string>> Details() const;
 
 private:
-    // Reads the record and prints what is new.
+    // Reads the record and, without --json, prints what is new.
     void Show();
 
     Context& context_;

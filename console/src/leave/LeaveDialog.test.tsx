@@ -46,6 +46,22 @@ describe('the leave dialog', () => {
     expect(api.of('directory.leave').map((call) => call.parameters)).toEqual([{ delete_account: false }]);
   });
 
+  it.each([
+    [['the computer account NAS1$ stays in the domain LAB'], /NAS1\$ is still in the domain/],
+    [[], 'The domain did not know the computer account NAS1$ any more.'],
+  ])('says what the record says of the account: %j', async (leftovers, text) => {
+    const record = { id: 'now', action: 'leave', domain: 'LAB', started: 1, finished: 2, success: true };
+    let left = false;
+    api.on('directory.leave', () => {
+      left = true;
+      return null;
+    });
+    api.on('directory.join_steps', () => (left ? { ...record, message: '', steps: [], leftovers } : null));
+    await user.type(confirm(), 'LAB');
+    await user.click(leave());
+    expect(await screen.findByText(text)).toBeVisible();
+  });
+
   it('deletes the account with the credentials of one who may', async () => {
     await user.click(screen.getByRole('checkbox', { name: /Delete the computer account NAS1\$/ }));
     await user.type(confirm(), 'LAB');

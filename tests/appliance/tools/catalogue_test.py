@@ -6,7 +6,7 @@ import re
 import subprocess
 import sys
 
-from vornctl_case import DEADLINE, DIRECTORY, VornctlCase, main, ok
+from vornctl_case import DEADLINE, DIRECTORY, DOMAIN, VornctlCase, main, ok
 
 ROOT = pathlib.Path(__file__).resolve().parents[3]
 CATALOGUE = ROOT / "appliance" / "catalogue"
@@ -45,6 +45,21 @@ def table(path):
     names = dict(re.findall(r'constexpr const char\* (k\w+) = "([^"]+)";', text))
     rows = re.findall(r'\{(k\w+), (\d+), "(\w+)", ', text)
     return [(names[name], int(version), method) for name, version, method in rows]
+
+
+def manual_parts():
+    """The manual's sections by their titles, without its marks and on one line each."""
+    manual = re.sub(r"\\f[BIRP]", "", read("appliance/tools/vornctl/vornctl.1")).replace("\\-", "-")
+    parts = re.split(r"^\.S[SH] ([^\n]+)\n", manual, flags=re.MULTILINE)[1:]
+    texts = [" ".join(re.sub(r"^\.[A-Z]+ ?", "", text, flags=re.MULTILINE).split()) for text in parts[1::2]]
+    return dict(zip([title.strip('"') for title in parts[0::2]], texts))
+
+
+def help_sentences(text):
+    """The options of a command's help, each with what is said of it, blanks folded."""
+    sentence = r"(\S[^\n]*(?:\n {26}\S[^\n]*)*)"
+    found = re.findall(rf"^  (?:-\w,)?(--[a-z0-9-]+)[^\n]*?(?:  +|\n {{26}}){sentence}", text, re.MULTILINE)
+    return [(option, " ".join(sentence.split())) for option, sentence in found]
 
 
 class Catalogue(VornctlCase):
@@ -111,6 +126,24 @@ class Catalogue(VornctlCase):
         self.assertEqual({number for number in self.numbers() if 100 <= number < 200}, set(framework.values()))
         self.assertEqual({number for number in self.numbers() if 200 <= number < 1000}, set(server.values()))
 
+    def test_the_refresh_has_every_code_of_its_tasks(self):
+        framework = enumerators("appliance/platform/webapi/framework_codes.h")
+        rows = {row["method"]: row for row in methods() if row["api"] == DOMAIN}
+        polling = read("appliance/platform/webapi/polling.cpp")
+        start = re.search(r"\nbool APIPolling::Start\(.*?\n}\n", polling, re.DOTALL).group()
+        # Whatever the store does in a start fails with a code of its own.
+        started = {*re.findall(r"POLLING_FAIL\((\w+)", start), "TaskStoreFailed"}
+        self.assertGreater(len(started), 2)
+        self.assertLessEqual({framework[name] for name in started}, set(rows["update_start"]["codes"]))
+        tasks = read("appliance/platform/webapi/task_store.cpp") + read("appliance/vornd/task_main.cpp")
+        ended = set(re.findall(r"FrameworkCode::(\w+)", tasks))
+        self.assertGreater(len(ended), 2)
+        self.assertLessEqual({framework[name] for name in ended}, set(rows["update_status"]["codes"]))
+        table = rows["update_status"]["description"]
+        shown = {int(code) for code in re.findall(r"\b\d{3,4}\b", table)}
+        self.assertLessEqual(set(rows["update_status"]["codes"]) - {2618}, shown)
+        self.assertLessEqual({framework["NoSuchTask"], framework["TaskStoreFailed"]}, shown)
+
     def test_the_program_has_every_text(self):
         explained = json.loads(self.run_program("explain", "--json").out)
         wanted = [{name: entry[name] for name in ("code", "meaning", "cause", "action")} for entry in codes()["codes"]]
@@ -170,6 +203,17 @@ class Catalogue(VornctlCase):
             self.assertGreater(len(options), 3)
             for option in options:
                 self.assertIn(option, manual, command)
+
+    def test_the_manual_says_what_the_help_says(self):
+        parts = manual_parts()
+        checked = 0
+        for command in re.findall(r"^  ([a-z]+) +[A-Z]", self.run_program("--help").out, re.MULTILINE):
+            (own,) = (text for title, text in parts.items() if command in re.findall(r"[a-z]+", title))
+            for option, sentence in help_sentences(self.run_program(command, "--help").out):
+                text = parts["OPTIONS"] if option in ("--json", "--socket", "--timeout", "--help") else own
+                self.assertIn(sentence.lower(), text.lower(), f"{command} {option}")
+                checked += 1
+        self.assertGreater(checked, 80)
 
     def test_the_manual_has_every_exit_code(self):
         numbers = re.findall(r"^    k\w+ = (\d+),", read("appliance/tools/vornctl/exit_code.h"), re.MULTILINE)

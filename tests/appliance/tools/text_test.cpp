@@ -151,8 +151,9 @@ TEST(Texts, OfTimes) {
 
 TEST(Json, IsPrintedInAscii) {
     Json::Value value;
-    value["text"] = "Ü\u0085\x1b";
-    EXPECT_EQ(JsonLine(value), R"({"text":"\u00dc\u0085\u001b"})");
+    value["text"] = "Ü\u0085\x1b\x7f\\";
+    EXPECT_EQ(JsonLine(value), R"({"text":"\u00dc\u0085\u001b\u007f\\"})");
+    EXPECT_EQ(JsonPretty(value), "{\n    \"text\" : \"\\u00dc\\u0085\\u001b\\u007f\\\\\"\n}");
 }
 
 TEST(Json, IsReadStrictly) {

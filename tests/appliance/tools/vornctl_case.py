@@ -27,6 +27,22 @@ EVENTS = "VORN.Appliance.EventLog"
 
 DEADLINE = 20  # seconds, of whatever a test waits for
 
+# What "get" answers of a member.
+MEMBER = {
+    "enable_domain": True,
+    "domain_name": "LAB",
+    "domain_type": "AD",
+    "manage_mode": 0,
+    "dns": "10.0.0.1,10.0.0.2",
+    "advance_domain_conf": {
+        "enable_advance_option": False,
+        "kdc": "",
+        "netbios_name": "LAB",
+        "fqdn_name": "LAB.TEST",
+        "register_nics": ["all"],
+    },
+}
+
 
 def ok(data):
     return {"success": True, "data": data}

@@ -3,23 +3,7 @@
 import json
 import subprocess
 
-from vornctl_case import DIRECTORY, DOMAIN, EVENTS, OPTIONS, SCHEDULE, VornctlCase, main, ok, refused
-
-MEMBER = {
-    "enable_domain": True,
-    "domain_name": "LAB",
-    "domain_type": "AD",
-    "manage_mode": 0,
-    "dns": "10.0.0.1,10.0.0.2",
-    "advance_domain_conf": {
-        "enable_advance_option": False,
-        "kdc": "",
-        "netbios_name": "LAB",
-        "fqdn_name": "LAB.TEST",
-        "register_nics": ["all"],
-    },
-}
-
+from vornctl_case import DIRECTORY, DOMAIN, EVENTS, MEMBER, OPTIONS, SCHEDULE, VornctlCase, main, ok, refused
 
 class Commands(VornctlCase):
     def test_status_of_a_member(self):
@@ -305,10 +289,14 @@ class Commands(VornctlCase):
         result = self.run_program("events", "--limit", "1")
         self.assertEqual(result.code, 0)
         self.assertIn("2025-11-27 07:59:53", result.out)
-        self.assertRegex(result.out, r"information +0x11800404")
+        self.assertRegex(result.out, r"^TIME +KIND +LEVEL +CODE +EVENT\n.* domain +information +0x11800404  ")
         self.assertIn("joined \\x1B[31mLAB\\x0A now", result.out)
         self.assertIn("1 of 12 events.", result.err)
         self.assert_body(f"{EVENTS}/1/list", {"offset": 0, "limit": 1})
+        self.script[f"{EVENTS}/1/list"] = ok({"total": 2, "events": [{**event, "kind": 7, "level": 3}, {"kind": "x"}]})
+        result = self.run_program("events")
+        self.assertRegex(result.out, r" kind 7 +level 3 +0x11800404 ")
+        self.assertRegex(result.out, r"\nnever +- +- ")
 
     def test_steps(self):
         self.script[f"{DIRECTORY}/1/join_steps"] = ok(
@@ -385,6 +373,17 @@ class Commands(VornctlCase):
         self.assertEqual(json.loads(result.out), ok(None))
         self.assert_body(f"{OPTIONS}/1/set", {"domain_nested_group": 2})
 
+    def test_no_control_byte_reaches_the_terminal(self):
+        every = "".join(map(chr, [*range(32), *range(127, 160)]))
+        for answer in (ok({every: every}), refused(2617, {every: every})):
+            self.script[f"{DOMAIN}/1/get"] = answer
+            self.script[f"{DOMAIN}/1/test_dc"] = answer
+            for arguments in (["call", DOMAIN, "1", "get"], ["call", DOMAIN, "1", "get", "--json"], ["test", "--json"]):
+                result = self.run_program(*arguments)
+                self.assertRegex(result.out + result.err, r"^[\n -~]+$", arguments)
+                if result.code != 1 or "--json" in arguments:
+                    self.assertIn(json.loads(result.out), (answer, answer.get("data")))
+
     def test_call_with_parameters_from_the_input(self):
         self.script[f"{OPTIONS}/1/set"] = ok(None)
         self.run_program("call", OPTIONS, "1", "set", "-", given=b'{"enable_sync_time": true}')
@@ -403,51 +402,6 @@ class Commands(VornctlCase):
             result = self.run_program("call", *arguments)
             self.assertEqual(result.code, 2, arguments)
         self.assertEqual(self.run_program("call", DOMAIN, "1", "get", "-", given=b"x" * 65537).code, 2)
-        self.assertEqual(self.server.requests, [])
-
-    def test_leave(self):
-        account = "the computer account NAS1$ stays on the domain controller"
-        self.script[f"{DIRECTORY}/1/join_steps"] = [
-            ok({"id": "old"}),
-            ok({"id": "new", "action": "leave", "steps": [], "leftovers": [account]}),
-        ]
-        self.script[f"{DOMAIN}/1/set"] = ok(None)
-        result = self.run_program("leave", "--yes")
-        self.assertEqual(result.code, 0)
-        self.assert_body(f"{DOMAIN}/1/set", {"enable_domain": False})
-        self.assertIn("no member of a domain any more", result.out)
-        self.assertIn(account, result.out.replace("\n           ", " "))
-
-    def test_leave_of_no_member(self):
-        self.script[f"{DOMAIN}/1/get"] = ok({"enable_domain": False})
-        self.script[f"{DIRECTORY}/1/join_steps"] = ok(None)
-        self.script[f"{DOMAIN}/1/set"] = ok(None)
-        result = self.run_program("leave", "--yes")
-        self.assertEqual((result.code, result.err), (0, ""))
-        self.assertIn("The appliance is not a member of a domain.\n", result.out)
-
-    def test_leave_names_the_account_also_without_its_steps(self):
-        self.script[f"{DOMAIN}/1/get"] = ok(MEMBER)
-        self.script[f"{DOMAIN}/1/set"] = ok(None)
-        result = self.run_program("leave", "--yes")
-        self.assertIn("computer account stays in the domain LAB.", result.out)
-
-    def test_leave_asks_and_can_not_without_a_terminal(self):
-        result = self.run_program("leave")
-        self.assertEqual(result.code, 2)
-        self.assertIn("--yes", result.err)
-        self.assertEqual(self.server.sent(f"{DOMAIN}/1/set"), [])
-
-    def test_leave_with_the_account(self):
-        self.script[f"{DIRECTORY}/1/leave"] = ok(None)
-        options = ("--yes", "--delete-account", "-u", "adm", "--password-stdin")
-        result = self.run_program("leave", *options, given=b"s3cret\n")
-        self.assertEqual(result.code, 0, result.err)
-        self.assert_body(f"{DIRECTORY}/1/leave", {"delete_account": True, "username": "adm", "password": "s3cret"})
-
-    def test_leave_refuses_half_a_request(self):
-        self.assertEqual(self.run_program("leave", "--yes", "--delete-account").code, 2)
-        self.assertEqual(self.run_program("leave", "--yes", "--user", "adm").code, 2)
         self.assertEqual(self.server.requests, [])
 
     def test_a_closed_output_shows(self):

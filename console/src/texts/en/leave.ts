@@ -22,6 +22,7 @@ export const leave = {
   'leave.cutOff': 'The answer was cut off, but the leave goes on in the appliance. Its steps are watched.',
   'leave.done': 'The appliance left {domain}.',
   'leave.done.deleted': 'The computer account {account} was deleted on the domain controller.',
+  'leave.done.gone': 'The domain did not know the computer account {account} any more.',
   'leave.done.stays':
     'The computer account {account} is still in the domain. Have it deleted on the domain controller when it is not needed any more.',
   'leave.failed': 'Leaving failed.',
