@@ -15,7 +15,7 @@ die() {
 }
 
 wrong_usage() {
-    printf '%s\n"./dev %s --help" tells what it takes.\n' "$1" "$COMMAND" >&2
+    printf '%s "./dev %s --help" tells what it takes.\n' "$1" "$COMMAND" >&2
     exit 2
 }
 

@@ -23,7 +23,8 @@ FRESH_PACKAGES=(debootstrap)
 LAB_PACKAGES=(samba winbind samba-dsdb-modules samba-vfs-modules samba-ad-provision smbclient ldb-tools krb5-user
     libsasl2-modules-gssapi-mit bind9-dnsutils libnss-winbind nftables attr acl iproute2 procps busybox cron curl
     python3 python3-samba)
-E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils openssl python3-pytest python3-pytest-xdist wrk)
+E2E_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" binutils libfaketime openssl python3-pytest
+    python3-pytest-xdist wrk)
 # The browser for the tests of the page; what they are written for is Debian's own.
 BROWSER_PACKAGES=("${BUILD_PACKAGES[@]}" "${LAB_PACKAGES[@]}" chromium)
 # The module for the target: a compiler for it, its emulator, and the sources of the JSON library that Debian has none of.

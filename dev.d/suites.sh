@@ -207,19 +207,29 @@ suite_library() {
     run_ctest_and_count build/release/tests/library --label-regex '^library$'
 }
 
-# Each worker has a lab of its own. Two of them, since a lab mostly waits, and the tests know how long things may take.
+# "./dev run" comes first, by itself: it stages the programs anew, which the other tests then use. Of those each worker has
+# a lab of its own. Two of them, since a lab mostly waits, and the tests know how long things may take.
 suite_lab() {
-    local results=$LOGS/lab.xml begin=$EPOCHREALTIME result=0 tests=0 failed=0
+    local result=0 tests=0 failed=0
     build_stage
-    rm -f -- "$results"
-    say "  \$ pytest tests/e2e"
-    /usr/bin/python3 -m pytest -p no:cacheprovider -n 2 --dist loadfile -v --durations=25 --junitxml "$results" \
-        --stage "$STAGE" tests/e2e 2>&1 </dev/null | tee -a "$LOG" | show_progress || result=$?
-    printf '  %-62s %8s s\n' "" "$(seconds_since "$begin")"
-    if [[ -f $results ]]; then
-        read -r tests failed < <(sum_of_results "$results")
+    rm -f -- "$LOGS"/lab{-run,}.xml
+    run_lab_tests "$LOGS/lab-run.xml" tests/dev || result=$?
+    run_lab_tests "$LOGS/lab.xml" -n 2 --dist loadfile --stage "$STAGE" tests/e2e || result=$?
+    # Each of them leaves its results, or there is nothing to count.
+    if [[ -f $LOGS/lab-run.xml && -f $LOGS/lab.xml ]]; then
+        read -r tests failed < <(sum_of_results "$LOGS/lab-run.xml" "$LOGS/lab.xml")
     fi
     count "$tests" "$failed"
+    return "$result"
+}
+
+# run_lab_tests RESULTS ARGUMENT...: pytest; the folder comes last.
+run_lab_tests() {
+    local begin=$EPOCHREALTIME result=0
+    say "  \$ pytest ${*: -1}"
+    /usr/bin/python3 -m pytest -p no:cacheprovider -v --durations=25 --junitxml "$@" 2>&1 </dev/null |
+        tee -a "$LOG" | show_progress || result=$?
+    printf '  %-62s %8s s\n' "" "$(seconds_since "$begin")"
     return "$result"
 }
 
@@ -272,6 +282,7 @@ suite_browser() {
 show_progress() {
     awk '
         / (FAILED|ERROR) tests/ { print "  failed: " $NF; fflush() }
+        /^tests\/[^ ]+ (FAILED|ERROR)/ { print "  failed: " $1; fflush() }
         match($0, /\[ *[0-9]+%\]/) {
             tenth = int(substr($0, RSTART + 1, RLENGTH - 3) / 10)
             if (tenth > shown) { print "  " tenth * 10 " %"; fflush(); shown = tenth }
@@ -279,10 +290,10 @@ show_progress() {
         /^E  / && ++lines <= 100 { print "    | " $0 }'
 }
 
-# sum_of_results FILE: how many tests ran, and how many of them failed or were skipped, which proves nothing.
+# sum_of_results FILE...: how many tests ran, and how many of them failed or were skipped, which proves nothing.
 sum_of_results() {
     sed -n 's/.*<testsuite [^>]*errors="\([0-9]*\)" failures="\([0-9]*\)" skipped="\([0-9]*\)" tests="\([0-9]*\)".*/\4 \1 \2 \3/p' \
-        "$1" | awk '{ tests += $1; failed += $2 + $3 + $4 } END { print tests + 0, failed + 0 }'
+        "$@" | awk '{ tests += $1; failed += $2 + $3 + $4 } END { print tests + 0, failed + 0 }'
 }
 
 suite_target() {

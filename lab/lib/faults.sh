@@ -1,7 +1,7 @@
 # What can go wrong with a controller: packets that vanish or are refused, slowness, a standstill, death.
 # shellcheck shell=bash disable=SC2016 # words in single quotes are expanded inside the host
 
-FAULTS=(smb-drop smb-rst ldap-drop kdc-drop dns-drop netbios-drop rpc-drop dead unplugged slow)
+FAULTS=(smb-drop smb-rst 445-drop ldap-drop kdc-drop dns-drop netbios-drop rpc-drop dead unplugged slow)
 SLOW_MILLISECONDS=150
 
 # rule_of FAULT: what the controller's firewall does with packets that come in.
@@ -9,6 +9,7 @@ rule_of() {
     case $1 in
         smb-drop) say 'tcp dport { 139, 445 } drop' ;;
         smb-rst) say 'tcp dport { 139, 445 } reject with tcp reset' ;;
+        445-drop) say 'tcp dport 445 drop' ;;
         ldap-drop) say 'meta l4proto { tcp, udp } th dport { 389, 636, 3268, 3269 } drop' ;;
         kdc-drop) say 'meta l4proto { tcp, udp } th dport { 88, 464 } drop' ;;
         dns-drop) say 'meta l4proto { tcp, udp } th dport 53 drop' ;;
@@ -146,14 +147,32 @@ kill_controller() {
     say "ok: the controller of $1 is dead"
 }
 
+# start_controller HOST [--clock SECONDS]: with a clock that differs from the machine's by so much.
 start_controller() {
-    controller_is_gone "$1" || die "the controller of $1 is running"
-    inside "$1" sh -c 'rm -f /run/samba/*.pid'
-    if [[ $1 == pdc ]]; then
+    local host=$1 clock=${3:-}
+    if (($# > 1)) && [[ $2 != --clock || $# != 3 || ! $clock =~ ^[+-]?[0-9]{1,9}$ || $host == pdc ]]; then
+        wrong_usage "\"start-dc\" takes a controller of Active Directory with --clock and seconds."
+    fi
+    controller_is_gone "$host" || die "the controller of $host is running"
+    inside "$host" sh -c 'rm -f /run/samba/*.pid'
+    if [[ $host == pdc ]]; then
         start_nt4
         await_nt4
-    else
-        start_directory "$1"
-        await_directory "$1"
+        return
     fi
+    if [[ -n $clock ]]; then
+        start_with_clock "$host" "$clock"
+    else
+        start_directory "$host"
+    fi
+    await_directory "$host"
+}
+
+# Nothing but the controller's programs sees that clock.
+start_with_clock() {
+    local library seconds=$2
+    [[ $seconds == [+-]* ]] || seconds=+$seconds
+    library=$(compgen -G '/usr/lib/*/faketime/libfaketime.so.1') || die "--clock needs the package libfaketime"
+    start_daemon "$1" "$STATE/$1.log" env "LD_PRELOAD=$library" "FAKETIME=${seconds}s" \
+        samba -F --no-process-group --debug-stdout
 }

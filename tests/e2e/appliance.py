@@ -2,11 +2,13 @@
 
 import contextlib
 import hashlib
+import re
 import socket
 import time
 import uuid
 
 from client import Client
+from processes import programs
 
 # What a failed join must not change, nor anything that is refused.
 CONFIGURATION = (
@@ -21,6 +23,13 @@ CONFIGURATION = (
 USER_DEBUG = 8 + 7
 MARK = "the tests were here: "
 SMBINFO = "/usr/vorn/etc/smbinfo.conf"
+JOURNAL_FOLDER = "/usr/vorn/etc/private/join"
+# What is written beside a file before it is put in its place, and what is kept aside.
+TEMPORARY = r".*\(\.vorn-[A-Za-z0-9]*\|\.tmp\|\.new\|-journal\|\.damaged\)"
+TEMPORARY_FOLDERS = ("/usr/vorn/etc", "/etc", "/run/vorn", "/var/lib/vorn", "/var/log", "/var/lib/samba", "/tmp")
+WINBIND_CACHES = [f"{folder}/{name}_cache.tdb" for folder in ("/var/cache/samba", "/var/lib/samba")
+                  for name in ("winbindd", "netsamlogon")]
+NAME_CACHES = ("/var/cache/samba/gencache.tdb", "/run/samba/gencache.tdb")
 
 
 class Appliance:
@@ -113,6 +122,25 @@ class Appliance:
                     pairs[key] = value
         return pairs
 
+    def temporaries(self):
+        found = self.exec("find", *TEMPORARY_FOLDERS, "-xdev", "-regex", TEMPORARY).out.split("\n")
+        # Samba keeps databases whose names look alike.
+        return [path for path in found if path and not path.startswith("/var/lib/samba/")]
+
+    def left_by_joins(self):
+        """What no join leaves behind, however it ended."""
+        folder = self.path(JOURNAL_FOLDER)
+        journal = [str(path) for path in folder.rglob("*")] if folder.exists() else []
+        probe = ["/run/vorn/join_probe"] if self.exists("/run/vorn/join_probe") else []
+        return self.temporaries() + journal + probe
+
+    def secrets(self):
+        """The names of what Samba keeps secret."""
+        if not self.exists("/var/lib/samba/private/secrets.tdb"):
+            return set()
+        dump = self.must("tdbdump", "/var/lib/samba/private/secrets.tdb").out
+        return {key.removesuffix("\\00") for key in re.findall(r'^key\(\d+\) = "(.*)"$', dump, re.M)}
+
     def syslog(self):
         """All that was said to the system log before this call, without the mark that tells when it is all there."""
         mark = f"{MARK}{uuid.uuid4()}"
@@ -144,6 +172,24 @@ class Appliance:
             time.sleep(0.05)
 
 
+def assert_cleared(machine, domain="LAB", realm="LAB.TEST"):
+    """Nothing of the membership is left on the appliance; to be asked right after a leave."""
+    assert machine.client.get() == {"enable_domain": False}
+    conf = machine.read("/usr/vorn/etc/smb.conf")
+    assert domain.encode() not in conf.upper(), conf
+    secrets = [key for key in machine.secrets() if key.upper().endswith((f"/{domain}", f"/{realm}"))]
+    assert secrets == [], secrets
+    keys = machine.exec("klist", "-k")
+    assert keys.code != 0 or realm not in keys.out, keys
+    assert not programs(machine, "winbindd"), "winbindd runs in a workgroup"
+    # The file-sharing service may begin the cache of names again.
+    left = [path for path in WINBIND_CACHES + ["/usr/vorn/etc/private/former_keys.json"] if machine.exists(path)]
+    left += [path for path in NAME_CACHES if domain.encode() in (machine.read(path) or b"").upper()]
+    left += machine.left_by_joins()
+    assert left == [], left
+    assert machine.client.test_dc() is False
+
+
 class Directory:
     """What an Active Directory holds, seen on its controller."""
 
@@ -167,6 +213,16 @@ class Directory:
             if names:
                 found.add((names[0], hashlib.sha256("\n".join(lines).encode()).hexdigest()))
         return found
+
+    def dns_nodes(self):
+        """The names in the zone of LAB.TEST; of the appliances' names also what they say."""
+        records = self.search("(objectClass=dnsNode)", "dnsRecord", base="DC=DomainDnsZones,DC=lab,DC=test")
+        nodes = set()
+        for record in records.split("\n\n"):
+            lines = [line for line in record.splitlines() if line and not line.startswith("#")]
+            # Of its own records the controller may renew the times.
+            nodes.update(lines[:1] if lines and not lines[0].startswith("dn: DC=nas") else ["\n".join(lines)])
+        return nodes
 
     def computer(self, name):
         return f"CN={name.upper()}," in self.search(f"(sAMAccountName={name.upper()}$)", "dn")

@@ -1,6 +1,8 @@
-"""A client of vornd's unix socket. It talks to the socket of an appliance of the lab from outside of its namespaces."""
+"""A client of vornd's unix socket. It talks to the socket of an appliance of the lab from outside of its namespaces.
+Every refusal that it gets must have a code that the catalogue has for it."""
 
 import json
+import pathlib
 import socket
 import time
 
@@ -9,6 +11,18 @@ CONF = "VORN.Core.Directory.Domain.Conf"
 SCHEDULE = "VORN.Core.Directory.Domain.Schedule"
 DIRECTORY = "VORN.Appliance.Directory"
 EVENTS = "VORN.Appliance.EventLog"
+
+
+CATALOGUE = pathlib.Path(__file__).resolve().parents[2] / "appliance" / "catalogue"
+DOCUMENTED = {
+    (row["api"], row["version"], row["method"]): set(row["codes"])
+    for row in json.loads((CATALOGUE / "methods.json").read_text(encoding="utf-8"))
+}
+SERVER_CODES = {
+    entry["code"]
+    for entry in json.loads((CATALOGUE / "error-codes.json").read_text(encoding="utf-8"))["codes"]
+    if entry["group"] == "server"
+}
 
 
 class Refused(Exception):
@@ -41,6 +55,20 @@ class Answer:
     @property
     def code(self):
         return self.body.get("error", {}).get("code")
+
+
+def check_documented(api, version, method, answer):
+    """A module's refusal, which has status 200, has a code of its method; any other has one of the server itself."""
+    if answer.ok:
+        return
+    codes = SERVER_CODES
+    if answer.status == 200:
+        # The highest version that is not above the one that was asked for.
+        versions = [row for row in DOCUMENTED if (row[0], row[2]) == (api, method) and row[1] <= version]
+        if not versions:
+            return  # a module of a test's own
+        codes = DOCUMENTED[max(versions)]
+    assert answer.code in codes, f"{api} {version} {method} answers {answer.code}, which methods.json does not list"
 
 
 class Client:
@@ -80,7 +108,9 @@ class Client:
         status, body = self.request(
             "POST", f"/webapi/{api}/{version}/{method}", json.dumps(parameters or {}).encode(), deadline=deadline
         )
-        return Answer(status, json.loads(body), time.monotonic() - started)
+        answer = Answer(status, json.loads(body), time.monotonic() - started)
+        check_documented(api, version, method, answer)
+        return answer
 
     # The methods that most tests call.
 

@@ -2,6 +2,10 @@
 Each is gone again at the end of its block."""
 
 import contextlib
+import pathlib
+import subprocess
+
+from lab import COMMAND
 
 SMALL_DISK = """set -e
 mkdir -p /mnt/small
@@ -78,6 +82,31 @@ def files_under(machine, *folders):
             if file.is_file() and not file.is_symlink() and file.name != "filler":
                 found[f"{folder}/{file.relative_to(top)}"] = file.read_bytes()
     return found
+
+
+@contextlib.contextmanager
+def without_trust(machine):
+    """Samba's tool of this name, but that winbind never confirms the membership."""
+    command = r"""printf '%s\n' '#!/bin/sh' 'case "$*" in *--check-secret*) exit 1 ;; esac' \
+        'exec /usr/bin/wbinfo.kept "$@"' >"$1" """
+    with replaced(machine, "/usr/bin/wbinfo", command):
+        yield
+
+
+@contextlib.contextmanager
+def name_server(machine, mode):
+    """Answers at 127.0.0.53 of the appliance for LAB.TEST, as odd_dns.py tells of that mode."""
+    script = pathlib.Path(__file__).with_name("odd_dns.py").read_text(encoding="utf-8")
+    process = subprocess.Popen(
+        [COMMAND, "exec", machine.host, "python3", "-c", script, "127.0.0.53", "10.77.0.10", mode],
+        env={**machine.lab.env, "PATH": "/usr/bin:/bin"}, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE)
+    try:
+        assert process.stdout.readline() == b"ready\n"
+        yield
+    finally:
+        process.kill()
+        process.wait(timeout=10)
+        process.stdout.close()
 
 
 class Log:

@@ -1,8 +1,9 @@
-"""A name server that passes questions on to a domain's controller, and adds names with control bytes to the answers.
+"""A name server that passes questions on to a domain's controller, and answers some of them in its own way.
 
-usage: odd_dns.py ADDRESS CONTROLLER add|only
+usage: odd_dns.py ADDRESS CONTROLLER add|only|none|NAME
 
-"only" leaves out what the controller says.
+"add" adds names with control bytes to the answers, "only" leaves out what the controller says besides. With "none"
+there is no service record at all; else each of them names the host NAME.
 """
 
 import socket
@@ -40,18 +41,28 @@ def end_of_question(packet):
     return at + 5
 
 
-def answer_to(packet, controller, add):
+def own_records(kind, mode):
+    """What is said to this kind of question; None leaves it to the controller alone."""
+    if mode in ("add", "only"):
+        return odd_records(kind) or None
+    if kind == SRV:
+        target = name(*mode.encode().split(b"."))
+        return [] if mode == "none" else [record(SRV, struct.pack(">HHH", 0, 100, 389) + target)]
+    return None
+
+
+def answer_to(packet, controller, mode):
     end = end_of_question(packet)
     kind = struct.unpack(">H", packet[end - 4:end - 2])[0]
-    odd = odd_records(kind)
-    if odd and not add:
+    odd = own_records(kind, mode)
+    if odd is not None and mode != "add":
         return packet[:2] + struct.pack(">HHHHH", 0x8580, 1, len(odd), 0, 0) + packet[12:end] + b"".join(odd)
     with socket.socket(socket.AF_INET, socket.SOCK_DGRAM) as back:
         back.settimeout(5)
         back.sendto(packet, (controller, 53))
         answer = back.recv(65536)
     count, authorities, more = struct.unpack(">HHH", answer[6:12])
-    if not odd or authorities or more or answer[3] & 0x0F:
+    if odd is None or authorities or more or answer[3] & 0x0F:
         return answer
     return answer[:6] + struct.pack(">HHH", count + len(odd), 0, 0) + answer[12:] + b"".join(odd)
 
@@ -64,7 +75,7 @@ def main():
     while True:
         packet, client = front.recvfrom(65536)
         try:
-            front.sendto(answer_to(packet, controller, mode == "add"), client)
+            front.sendto(answer_to(packet, controller, mode), client)
         except (OSError, IndexError, struct.error) as error:
             print(error, flush=True)
 

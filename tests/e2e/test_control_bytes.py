@@ -14,7 +14,7 @@ from lab import COMMAND, password
 from obstacles import files_under
 
 ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
-CONTROL = ["\n", "\r", "\0", "\x1b", "\x7f"]
+CONTROL = ["\n", "\r", "\t", "\0", "\x01", "\x1b", "\x7f"]
 ODD_DNS = pathlib.Path(__file__).with_name("odd_dns.py")
 FILES = ("/etc/resolv.conf", "/etc/vorninfo.conf", "/etc/krb5.conf", "/etc/cron.d/vorn", "/etc/hosts",
          "/etc/nsswitch.conf", "/etc/samba/smb.conf", "/run/vorn/kerberos/krb5.conf")
@@ -55,7 +55,8 @@ def refusals():
         yield DOMAIN, "set", {**join, "domain_name": "nowhere.test" + end}
         yield DOMAIN, "set", {**join, "username": "nobody" + end}
         yield DOMAIN, "set", {**join, "dns": "10.77.0.10" + end}
-        yield DOMAIN, "set", {**join, "dns": f"10.77.0.10,{byte}"}
+        if byte in "\n\r\t\0":  # blanks, and the end of a text: alone they might count as nothing
+            yield DOMAIN, "set", {**join, "dns": f"10.77.0.10,{byte}"}
         for key, value in (("kdc", "10.77.0.10"), ("netbios_name", "LAB"), ("fqdn_name", "lab.test")):
             yield DOMAIN, "set", {**join, "advance_domain_conf": {**advanced, key: value + end}}
         yield DOMAIN, "set", {**join, "advance_domain_conf": {**advanced, "register_nics": ["eth0" + end]}}

@@ -1,26 +1,18 @@
 """Controllers that die, are cut off, stand still, are slow or turn clients away, before a call and in its middle: each
 call ends within its deadline with the right answer, nothing is lost, and all is well once the controller is back."""
 
-import concurrent.futures
 import contextlib
-import json
-import statistics
-import time
 
 import pytest
 
 from appliance import Appliance, Directory
-from client import DIRECTORY, DOMAIN
 from conftest import remove_computer
-from lab import password
+from controller_faults import (
+    ASK_SECONDS, SET_SECONDS, Calls, administrator, fault, fetched_in, lists, names_in, record_of, tools, wait_for_step)
 from processes import held, programs, tasks
 
-ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
+ADMINISTRATOR = administrator("LAB")
 KNOWN = ["LAB", "OTHER"]
-
-GET_SECONDS = 0.1
-ASK_SECONDS = 15
-SET_SECONDS = 30
 
 
 @pytest.fixture(scope="module")
@@ -54,70 +46,10 @@ def no_faults(lab):
     lab.must("fault", "none")
 
 
-def fault(lab, name):
-    if name == "killed":
-        return lab.killed("dc1")
-    if name == "frozen":
-        return lab.frozen("dc1")
-    return lab.fault(name, "dc1")
-
-
-class Calls:
-    """Calls that run at the same time, "get" again and again beside them."""
-
-    def __init__(self, machine):
-        self.machine = machine
-        self.pool = concurrent.futures.ThreadPoolExecutor()
-        self.running = {}
-
-    def start(self, name, function, *words, **more):
-        self.running[name] = self.pool.submit(function, *words, **more)
-
-    def ask(self):
-        client = self.machine.client
-        self.start("test_dc", client.call, DOMAIN, 1, "test_dc")
-        self.start("list", client.call, DOMAIN, 1, "get_domain_list")
-        self.start("list 2", client.call, DOMAIN, 2, "get_domain_list")
-
-    def end(self):
-        """The answers, when all have come."""
-        seconds = []
-        while not all(call.done() for call in self.running.values()):
-            answer = self.machine.client.call(DOMAIN, 1, "get")
-            assert answer.ok
-            seconds.append(answer.seconds)
-            time.sleep(0.05)
-        # Other work of this machine may hold up a single one.
-        assert not seconds or statistics.median(seconds) < GET_SECONDS, seconds
-        answers = {name: call.result() for name, call in self.running.items()}
-        for name in ("test_dc", "list", "list 2"):
-            if name in answers:
-                assert answers[name].seconds < ASK_SECONDS, name
-        for name in ("set", "leave"):
-            if name in answers:
-                assert answers[name].seconds < SET_SECONDS, name
-        return answers
-
-
-def lists(machine):
-    """Every list with its entries, and when it was fetched."""
-    found = {}
-    for row in machine.client.call(DIRECTORY, 1, "domains").data["domains"]:
-        kind = row["kind"] + "s"
-        page = machine.client.call(DIRECTORY, 1, kind, {"domain": row["domain"], "offset": 0, "limit": 1000}).data
-        found[row["domain"], kind] = (row["fetched"], [entry["name"] for entry in page["entries"]])
-    assert {domain for domain, _ in found} == set(KNOWN)
-    return found
-
-
-def names_in(found):
-    return {key: names for key, (_, names) in found.items()}
-
-
 def assert_kept(before, after):
     """The lists of the domain that could not be asked are the old ones; those of the other may be new."""
     assert names_in(after) == names_in(before)
-    assert all(after[key][0] == fetched for key, (fetched, _) in before.items() if key[0] == "LAB")
+    assert fetched_in(after, "LAB") == fetched_in(before, "LAB")
 
 
 def assert_put_back(machine, directory, configuration, objects):
@@ -155,11 +87,11 @@ BEFORE = [
 
 @pytest.mark.parametrize("name, works, refresh, join, more", BEFORE, ids=[case[0] for case in BEFORE])
 def test_a_fault_before_the_calls(lab, member, newcomer, name, works, refresh, join, more):
-    before, configuration, objects = lists(member), newcomer.configuration(), Directory(lab, "dc1").objects()
+    before, configuration, objects = lists(member, KNOWN), newcomer.configuration(), Directory(lab, "dc1").objects()
     with fault(lab, name):
         calls = Calls(member)
         calls.ask()
-        calls.start("refresh", member.client.refresh)
+        calls.refresh()
         calls.start("set", newcomer.client.join, "lab.test", *ADMINISTRATOR, **more)
         answers = calls.end()
         assert answers["test_dc"].data == {"test_join_success": works}
@@ -168,85 +100,21 @@ def test_a_fault_before_the_calls(lab, member, newcomer, name, works, refresh, j
         assert answers["refresh"].code == refresh
         assert answers["set"].code == join, newcomer.ctl("steps").text
         if refresh:
-            assert_kept(before, lists(member))
+            assert_kept(before, lists(member, KNOWN))
     if join:
         assert newcomer.configuration() == configuration
         assert Directory(lab, "dc1").objects() == objects
     assert_well(member)
 
 
-def record_of(machine):
-    try:
-        return json.loads(machine.path("/run/vorn/join_steps.json").read_bytes())
-    except FileNotFoundError:
-        return {"id": None, "steps": []}
-
-
-def tools(machine):
-    return programs(machine, "vornjoin", "net", "wbinfo", "rpcclient")
-
-
-def wait_for_step(machine, before, name):
-    end = time.monotonic() + 20
-    while True:
-        record = record_of(machine)
-        if record["id"] != before and any(step["name"] == name for step in record["steps"]):
-            return
-        assert time.monotonic() < end, (name, record)
-        time.sleep(0.001)
-
-
-# (step, fault, codes that say what is wrong; none: the membership is there already, and stays)
-MIDDLE = [
-    ("workgroup", "dead", {2613}),
-    ("credentials", "kdc-drop", {2615}),
-    ("credentials", "smb-rst", {2606}),
-    ("join", "killed", {2605, 2606, 2615}),
-    ("join", "frozen", {2605, 2606, 2617}),
-    ("confirm join", "dead", {2614}),
-    ("winbind", "dead", {2601}),
-    ("dns", "frozen", None),
-]
-SHORT = ("workgroup", "credentials")
-
-
-@pytest.mark.parametrize("step, name, codes", MIDDLE, ids=[f"{case[0]}, {case[1]}" for case in MIDDLE])
-def test_a_fault_in_the_middle_of_a_join(lab, newcomer, step, name, codes):
-    directory = Directory(lab, "dc1")
-    configuration, objects = newcomer.configuration(), directory.objects()
-    before = record_of(newcomer)["id"]
-    with contextlib.ExitStack() as faults, contextlib.ExitStack() as stopped:
-        calls = Calls(newcomer)
-        # Else a short step can be over before it is seen.
-        with lab.fault("slow", "dc1") if step in SHORT else contextlib.nullcontext():
-            calls.start("set", newcomer.client.join, "lab.test", *ADMINISTRATOR)
-            wait_for_step(newcomer, before, step)
-            assert stopped.enter_context(held(lambda: tools(newcomer)))
-        faults.enter_context(fault(lab, name))
-        stopped.close()
-        answer = calls.end()["set"]
-    record = record_of(newcomer)
-    names = [row["name"] for row in record["steps"]]
-    failed = [row["name"] for row in record["steps"] if row["outcome"] == "failed"]
-    if codes is None:
-        assert answer.ok, record
-    else:
-        assert answer.code in codes, record
-        assert failed and names.index(failed[0]) >= names.index(step), record
-        assert_put_back(newcomer, directory, configuration, objects)
-        assert newcomer.client.join("lab.test", *ADMINISTRATOR).ok, newcomer.ctl("steps").text
-    assert newcomer.client.test_dc() is True
-    assert newcomer.client.domains(1) == KNOWN
-
-
 @pytest.mark.parametrize("name", ["frozen", "killed"])
 def test_a_fault_in_the_middle_of_questions_and_a_refresh(lab, member, name):
-    before = lists(member)
+    before = lists(member, KNOWN)
     with contextlib.ExitStack() as faults, contextlib.ExitStack() as stopped:
         calls = Calls(member)
         # A question takes some milliseconds: it is caught because its answer is slow, winbind's does not come yet.
         with lab.fault("slow", "dc1"):
-            calls.start("refresh", member.client.refresh)
+            calls.refresh()
             member.wait_until(lambda: member.exists("/tmp/domain_user.pid"), 20, "a fetch")
             assert stopped.enter_context(held(lambda: tasks(member)))
             with held(lambda: programs(member, "winbindd")):
@@ -261,7 +129,7 @@ def test_a_fault_in_the_middle_of_questions_and_a_refresh(lab, member, name):
         assert answers["list"].data == {"domain_list": KNOWN}
         assert answers["refresh"].code == 2623, member.syslog()[-3000:]
         # What was complete before the fault is new.
-        assert names_in(lists(member)) == names_in(before)
+        assert names_in(lists(member, KNOWN)) == names_in(before)
     assert_well(member)
 
 
@@ -289,7 +157,7 @@ def test_a_slow_controller(lab, member, newcomer):
     with lab.fault("slow", "dc1"):
         calls = Calls(member)
         calls.ask()
-        calls.start("refresh", member.client.refresh, "LAB")
+        calls.refresh("LAB")
         calls.start("set", newcomer.client.join, "lab.test", *ADMINISTRATOR)
         answers = calls.end()
         assert answers["test_dc"].data == {"test_join_success": True}
@@ -310,7 +178,7 @@ def test_a_join_while_a_trusted_domain_is_dead(lab, newcomer):
     with lab.fault("dead", "dc2"):
         answer = newcomer.client.join("lab.test", *ADMINISTRATOR)
         assert answer.ok, newcomer.ctl("steps").text
-        assert answer.seconds < 20
+        assert answer.seconds < SET_SECONDS
         assert newcomer.client.test_dc() is True
         assert "LAB" in newcomer.client.domains(1)
     # Winbind had no time for them during the join.

@@ -1,5 +1,6 @@
 """docs/web-api.md, docs/error-codes.md and the OpenAPI document say what the server does."""
 
+import contextlib
 import copy
 import json
 import re
@@ -8,7 +9,7 @@ import sys
 
 import pytest
 
-from client import CONF, DIRECTORY, DOMAIN, EVENTS, SCHEDULE
+from client import CONF, DIRECTORY, DOMAIN, EVENTS, SCHEDULE, Answer, check_documented
 from lab import PROJECT, password
 
 METHODS = json.loads((PROJECT / "appliance/catalogue/methods.json").read_text(encoding="utf-8"))
@@ -261,6 +262,23 @@ def test_every_code_is_explained(joined):
     for code in sorted(explained):
         result = joined.exec("vornctl", "explain", str(code))
         assert result.code == 0 and str(code) in result.out, result
+
+
+def test_a_code_that_no_method_lists_shows():
+    """The client checks every refusal of every test against the catalogue."""
+    for api, version, method, status, code, known in [
+        (CONF, 1, "set", 200, 2618, True),
+        (CONF, 3, "set", 200, 2618, True),
+        (CONF, 1, "set", 200, 2623, False),
+        (DOMAIN, 2, "get_domain_list", 200, 2600, True),
+        (DOMAIN, 1, "get_domain_list", 200, 2600, False),
+        (CONF, 1, "set", 503, 240, True),
+        (CONF, 1, "set", 400, 2618, False),
+        (CONF, 1, "set", 200, 240, False),
+    ]:
+        answer = Answer(status, {"success": False, "error": {"code": code, "errors": None}}, 0)
+        with contextlib.nullcontext() if known else pytest.raises(AssertionError, match="does not list"):
+            check_documented(api, version, method, answer)
 
 
 def test_the_pages_are_not_stale():

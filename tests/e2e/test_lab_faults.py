@@ -1,5 +1,6 @@
 """The lab's faults: who can't reach what any more, who still can, and that all is well again afterwards."""
 
+import datetime
 import time
 
 import pytest
@@ -32,6 +33,7 @@ def states(lab, host, controller="dc1", silent=()):
 @pytest.mark.parametrize("fault, closed, state", [
     ("smb-drop", (139, 445), "silent"),
     ("smb-rst", (139, 445), "refused"),
+    ("445-drop", (445,), "silent"),
     ("ldap-drop", (389,), "silent"),
     ("kdc-drop", (88,), "silent"),
     ("dns-drop", (53,), "silent"),
@@ -116,10 +118,30 @@ def test_a_killed_controller_refuses_and_can_be_started_again(lab, controller):
     assert knock(lab, "nas1", controller, 445)[0] == "open"
 
 
+def test_a_controller_whose_clock_differs(lab):
+    def difference():
+        told = lab.exec("nas1", "net", "time", "system", "-S", lab.address("dc1"))
+        here = lab.exec("nas1", "date", "+%m%d%H%M%Y.%S")
+        assert told.code == here.code == 0, told
+        return [datetime.datetime.strptime(result.out.strip(), "%m%d%H%M%Y.%S") for result in (told, here)]
+
+    lab.must("kill-dc", "dc1")
+    try:
+        lab.must("start-dc", "dc1", "--clock", "600", deadline=90)
+        told, here = difference()
+        assert 595 < (told - here).total_seconds() < 605
+    finally:
+        lab.must("kill-dc", "dc1")
+        lab.must("start-dc", "dc1", deadline=90)
+    told, here = difference()
+    assert abs((told - here).total_seconds()) < 5
+
+
 @pytest.mark.parametrize("words", [
     ("fault",), ("fault", "nonsense"), ("fault", "dead", "nas1"), ("fault", "dead", "dc1", "--from"),
     ("fault", "dead", "dc1", "dc2"), ("freeze", "nas1"), ("kill-dc",), ("vornd", "nas1", "jump"), ("vornd", "nas1"),
     ("exec", "nas1"), ("nonsense",), (), ("dns", "nas1"), ("dns", "nas1", "-x"), ("down", "now"),
+    ("start-dc", "dc1", "--clock"), ("start-dc", "pdc", "--clock", "1"), ("start-dc", "dc1", "--clock", "soon"),
     ("vornd", "dc1", "stop"), ("httpd", "nas1"), ("httpd", "nas1", "jump"), ("httpd", "dc1", "start"),
     ("httpd", "nas1", "stop", "now"), ("httpd", "nas1", "start", "--listen"), ("httpd", "nas1", "start", "now"),
     ("httpd", "nas1", "start", "--listen", "localhost:1"),

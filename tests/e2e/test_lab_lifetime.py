@@ -180,6 +180,7 @@ def test_interrupted_up_takes_itself_down(make, seconds):
 
 
 def test_down_ends_an_up_that_is_under_way(make, tmp_path):
+    before = machine()
     lab = make("a", tmp_path / "empty-cache")
     up = subprocess.Popen([COMMAND, "up"], env={**os.environ, **lab.env}, stdout=subprocess.DEVNULL,
                           stderr=subprocess.DEVNULL, start_new_session=True)
@@ -191,6 +192,7 @@ def test_down_ends_an_up_that_is_under_way(make, tmp_path):
     assert lab.down().seconds < 10
     up.wait(timeout=10)
     gone(lab, networks, 5)  # the killed command's own helpers hear of it a moment later
+    assert machine() == before
     assert list((tmp_path / "empty-cache").glob("*.tar")) == []
 
 
@@ -289,9 +291,14 @@ def test_each_appliance_gets_its_own_copy_of_the_stage(make, tmp_path):
     assert lab.command("vornd", "nas7", "start").code == 1
 
 
+BULK = ("sh", "-c", "ldbsearch -H /var/lib/samba/private/sam.ldb '(sAMAccountName=bulk*)' dn | grep -c '^dn: CN=bulk'")
+
+
 def test_many_users(make, tmp_path):
+    before = machine()
     lab = make("a")
-    lab.up("--bulk", "2000", "--appliances", "nas7")
+    made = lab.up("--bulk", "2000", "--appliances", "nas7").out
+    assert "dc1: 2000 users and 1000 groups added" in made and "2000 users restored" not in made, made
     lab.write("nas7", "/etc/samba/smb.conf",
               "[global]\n\tworkgroup = LAB\n\trealm = LAB.TEST\n\tsecurity = ads\n\tnetbios name = NAS7\n")
     found = lab.exec("nas7", "net", "ads", "search", "(&(sAMAccountType=805306368)(sAMAccountName=bulk*))",
@@ -306,6 +313,16 @@ def test_many_users(make, tmp_path):
     lab.must("kill-dc", "dc1")
     checked = lab.exec("dc1", "samba-tool", "dbcheck", deadline=120)
     assert checked.code == 0 and re.search(r"Checked \d+ objects \(0 errors\)", checked.out), checked
+    count = lab.exec("dc1", *BULK).out
+    # The second time they come from the cache, and they are the same.
+    again = lab.up("--bulk", "2000", "--appliances", "nas7").out
+    assert "dc1: domain with 2000 users restored from the cache" in again and "added" not in again, again
+    assert lab.exec("dc1", *BULK).out == count and int(count) >= 3000
+    networks = namespaces(lab)
+    assert len(networks) == 3 and processes(lab, networks)
+    lab.down()
+    gone(lab, networks)
+    assert machine() == before
 
 
 @pytest.mark.parametrize("words", [

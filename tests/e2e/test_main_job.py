@@ -1,9 +1,20 @@
 """The whole life of a membership, through the web API: status, join, test, lists, refresh, options, schedule, leave."""
 
-from client import DOMAIN
+from client import DOMAIN, EVENTS
 from lab import password
+from obstacles import Log
 
 ADMINISTRATOR = ("Administrator", password("LAB", "Administrator"))
+
+
+JOINED = {"code": 0x11800404, "kind": 2, "level": 1, "text": "The appliance joined the domain LAB."}
+LEFT = {"code": 0x11800506, "kind": 2, "level": 1,
+        "text": "The appliance left its domain and is back in the workgroup WORKGROUP."}
+
+
+def newest_event(client):
+    event = client.call(EVENTS, 1, "list").data["events"][0]
+    return {key: event[key] for key in JOINED}
 
 
 def test_the_whole_main_job(appliance, directory):
@@ -15,6 +26,7 @@ def test_the_whole_main_job(appliance, directory):
     answer = client.join("lab.test", *ADMINISTRATOR)
     assert answer.body == {"success": True, "data": None}, appliance.ctl("steps").text + appliance.syslog()
     assert directory.computer(appliance.host)
+    assert newest_event(client) == JOINED
 
     status = client.get()
     assert status["enable_domain"] is True
@@ -61,8 +73,10 @@ def test_the_whole_main_job(appliance, directory):
     client.schedule(date_type=2)
     assert client.schedule() == {"date_type": 2}
 
+    log = Log(appliance)
     assert client.leave().body == {"success": True, "data": None}
     assert client.get() == {"enable_domain": False}
     assert not appliance.trust_works()
-    assert "NAS1$" in appliance.syslog() or f"{appliance.host.upper()}$" in appliance.syslog()
+    assert newest_event(client) == LEFT
+    assert log.says("vornjoin[", "the computer account NAS1$ stays in the domain LAB"), log.lines
     assert client.call(DOMAIN, 1, "get_domain_list").data == {"domain_list": []}

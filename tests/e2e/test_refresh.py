@@ -1,10 +1,14 @@
 """The local lists of users and groups: complete or as they were, whatever happens to the controllers."""
 
+import contextlib
 import threading
 import time
 
 from client import DIRECTORY
-from processes import wait_for_tasks
+from controller_faults import REFRESH_SECONDS, Calls, administrator, lists, names_in
+from processes import held, tasks, wait_for_tasks
+
+KNOWN = ["LAB", "OTHER"]
 
 
 def progress(machine):
@@ -43,15 +47,86 @@ def test_an_unknown_domain(member):
     assert answer.code == 2623
 
 
+def ripened(machine):
+    """All lists; what is fetched from now on has a later time, which counts in seconds."""
+    before = lists(machine, KNOWN)
+    newest = max(fetched for fetched, _ in before.values())
+    machine.wait_until(lambda: time.time() >= newest + 1, 5, "the next second")
+    return before
+
+
+def assert_new(before, after, *keys):
+    """These lists are new, all others are as they were."""
+    assert {key for key in before if after[key][0] > before[key][0]} == set(keys)
+    assert names_in(after) == names_in(before)
+
+
 def test_a_dead_trusted_domain_keeps_nobody_from_being_fetched(member, lab):
     assert member.client.refresh().ok
-    zed = names(member, "users", "OTHER")
+    before = ripened(member)
     with lab.fault("dead", "dc2"):
-        answer = member.client.refresh(deadline=180)
+        calls = Calls(member)
+        calls.ask()
+        calls.refresh()
+        answers = calls.end()
+        assert answers["refresh"].code == 2623
+        assert answers["test_dc"].data == {"test_join_success": True}
+        assert answers["list"].data == {"domain_list": KNOWN}
+        assert [row[0] for row in answers["list 2"].data["domain_list"]] == KNOWN
+        assert_new(before, lists(member, KNOWN), ("LAB", "users"))
+        # The appliance's own program goes on with the groups.
+        before = ripened(member)
+        ended = member.exec("/usr/vorn/sbin/vornwin", "-updateDomain", deadline=120)
+        assert ended.code == 1, ended
+        assert_new(before, lists(member, KNOWN), ("LAB", "users"), ("LAB", "groups"))
+
+
+def test_a_trusted_domain_that_stands_still_keeps_nobody_waiting(member, lab):
+    assert member.client.refresh().ok
+    before = ripened(member)
+    with lab.frozen("dc2"):
+        task = member.client.start_refresh().data["task_id"]
+        users = ("LAB", "users")
+        member.wait_until(lambda: lists(member, KNOWN)[users][0] > before[users][0], 20, "LAB's users")
+        end = time.monotonic() + REFRESH_SECONDS
+        while (answer := member.client.refresh_status(task)).ok and answer.data["status"] != "finish":
+            assert time.monotonic() < end, "the refresh does not end"
+            time.sleep(0.1)
         assert answer.code == 2623
-        assert member.client.domains(1) == ["LAB", "OTHER"]
-        assert "alice" in names(member, "users", "LAB")
-        assert names(member, "users", "OTHER") == zed
+        assert_new(before, lists(member, KNOWN), ("LAB", "users"))
+
+
+def test_a_controller_that_dies_while_groups_are_fetched(member, lab):
+    assert member.client.refresh().ok
+    before = ripened(member)
+    calls = Calls(member)
+    with contextlib.ExitStack() as faults, contextlib.ExitStack() as stopped:
+        with lab.fault("slow", "dc1", only=member.host):
+            calls.refresh()
+            member.wait_until(lambda: member.exists("/tmp/domain_group.pid"), 20, "the fetch of groups")
+            assert stopped.enter_context(held(lambda: tasks(member)))
+        faults.enter_context(lab.killed("dc1"))
+        stopped.close()
+        assert calls.end()["refresh"].code == 2623
+        after = lists(member, KNOWN)
+        assert after["LAB", "users"][0] > before["LAB", "users"][0]
+        assert after["LAB", "groups"] == before["LAB", "groups"]
+        assert names_in(after) == names_in(before)
+    assert member.client.refresh().data == {"status": "finish"}
+
+
+def test_units_are_listed_as_last_known_while_the_controller_is_dead(appliance, lab):
+    joined = appliance.client.join("lab.test", *administrator("LAB"), manage_mode=1)
+    assert joined.ok, appliance.ctl("steps").text
+    units = appliance.client.domains(2)
+    assert ["--", "", "LAB"] in units and any("Sales, West" in row[0] for row in units), units
+    with lab.fault("dead", "dc1", only=appliance.host):
+        calls = Calls(appliance)
+        calls.ask()
+        answers = calls.end()
+        assert answers["list"].data == {"domain_list": ["LAB"]}
+        assert answers["list 2"].data == {"domain_list": units}
+        assert answers["test_dc"].data == {"test_join_success": False}
 
 
 def test_a_dead_controller_never_empties_a_list(member, lab):

@@ -1,128 +1,21 @@
 """Passwords: of the account that joins and of the machine itself. They are in no list of processes, no file, no log and
 no answer but where they must be, whether a join succeeds, fails or is killed."""
 
-import base64
 import contextlib
 import json
-import os
-import pathlib
 import re
-import secrets
 import signal
-import stat
 import threading
 import time
 
 import pytest
 
+from canary import SECRETS, Answers, Canary, Sampler, check_programs, files_written, machine_password, spellings, where
 from client import DIRECTORY, DOMAIN
-from processes import processes, programs
-
-# What the appliance hands the password to by the environment, which nobody but root can read. "timeout" is what ends
-# the join's own tool should its caller die.
-TOOLS = {"net", "rpcclient", "timeout"}
-VARIABLE = "PASSWD"
-WRITABLE = ("var", "run", "etc", "usr/vorn", "tmp", "root", "home", "srv", "opt", "dev/shm")
-# The domains that the lab keeps for the next time.
-FOREIGN = {"/var/cache/vorn-lab"}
-SECRETS = "/var/lib/samba/private/secrets.tdb"
-
-
-class Canary:
-    """A password that stands nowhere else in the world: its middle is looked for, so that no escaping hides it."""
-
-    def __init__(self):
-        self.middle = secrets.token_hex(12)
-        self.text = f"Cän %'\"{self.middle}$\\ Z"
-
-
-def spellings(text):
-    """As which bytes a text may stand in a file."""
-    plain = text.encode()
-    found = {plain, plain.hex().encode(), plain.hex().upper().encode()}
-    for wide in (text.encode("utf-16-le"), text.encode("utf-16-be")):
-        found.add(wide)
-    # Wherever it begins in what was encoded: without the ends, which depend on the neighbours.
-    for shift in range(3):
-        found.add(base64.b64encode(b"x" * shift + plain)[4:-4])
-    return found
-
-
-def files_written(machine, since):
-    """Every file of the appliance that was written since then, as (path, content)."""
-    root = str(machine.lab.root(machine.host))
-    for top in WRITABLE:
-        for at, folders, names in os.walk(f"{root}/{top}"):
-            folders[:] = [name for name in folders if f"{at}/{name}".removeprefix(root) not in FOREIGN]
-            for name in names:
-                with contextlib.suppress(OSError):  # gone meanwhile
-                    info = os.lstat(f"{at}/{name}")
-                    if stat.S_ISREG(info.st_mode) and info.st_ctime >= since:
-                        yield f"{at}/{name}".removeprefix(root), pathlib.Path(at, name).read_bytes()
-            if top == "root":
-                break  # what the machine's own administrator has there is a lot, and none of a program's
-
-
-def where(machine, since, text):
-    wanted = spellings(text)
-    return [path for path, content in files_written(machine, since) if any(piece in content for piece in wanted)]
-
-
-class Sampler:
-    """Reads the arguments and the environment of every process of a host, again and again."""
-
-    def __init__(self, machine):
-        self.machine = machine
-        self.arguments = {}
-        self.environments = {}
-        self.passes = 0
-        self.ended = threading.Event()
-        self.thread = threading.Thread(target=self.run, daemon=True)
-
-    def __enter__(self):
-        self.started = time.monotonic()
-        self.thread.start()
-        return self
-
-    def __exit__(self, *_):
-        self.seconds = time.monotonic() - self.started
-        self.ended.set()
-        self.thread.join(10)
-
-    def run(self):
-        while not self.ended.is_set():
-            for process in processes(self.machine):
-                self.arguments.setdefault(process.read("cmdline"), process)
-                environment = process.read("environ")
-                if environment not in self.environments:
-                    self.environments[environment] = (process.program, self.owner(process))
-            self.passes += 1
-
-    @staticmethod
-    def owner(process):
-        """Who may read the environment: the owner and the mode of its file, and the process's users."""
-        try:
-            info = os.stat(f"{process.folder}/environ")
-            return info.st_uid, oct(info.st_mode & 0o777), process.status("Uid")
-        except OSError:
-            return None
-
-    def check(self, *texts):
-        """Arguments hold none of the texts, environments only where they may; answers in which programs' ones."""
-        seen = set()
-        for text in texts:
-            plain = text.encode()
-            for words in self.arguments:
-                assert plain not in words, f"in the arguments of {words!r}"
-            for environment, (program, owner) in self.environments.items():
-                for entry in environment.split(b"\0"):
-                    if plain in entry:
-                        assert entry.startswith(VARIABLE.encode() + b"="), f"{program}: {entry!r}"
-                        name = os.path.basename(program)
-                        assert name in TOOLS | {""}, f"in the environment of {program}"
-                        assert owner is None or not owner[2] or owner == (0, "0o400", ["0"] * 4), owner
-                        seen.add(name)
-        return seen
+from door import Door
+from exec_watch import ExecWatch
+from obstacles import replaced
+from processes import held, programs
 
 
 @pytest.fixture
@@ -138,41 +31,6 @@ def canary(lab):
 def give_rights(lab):
     result = lab.exec("dc1", "samba-tool", "group", "addmembers", "Domain Admins", "canary", deadline=60)
     assert result.code == 0, result
-
-
-class Answers:
-    """Every answer that a client got, as text."""
-
-    def __init__(self, machine):
-        self.machine = machine
-        self.texts = []
-
-    def keep(self, answer):
-        self.texts.append(json.dumps(answer.body, ensure_ascii=False))
-        return answer
-
-    def join(self, *words, **more):
-        return self.keep(self.machine.client.join(*words, **more))
-
-    def raw(self, target, body):
-        status, text = self.machine.client.request("POST", target, body)
-        self.texts.append(text.decode(errors="backslashreplace"))
-        return status
-
-    def ctl(self, *words, **more):
-        result = self.machine.ctl(*words, **more)
-        self.texts.append(result.text)
-        return result
-
-    def holding(self, text):
-        return [answer for answer in self.texts if text in answer]
-
-
-def machine_password(machine):
-    """What the appliance has for its own account: the bytes of the secret, as text."""
-    dump = machine.must("tdbdump", "-k", "SECRETS/MACHINE_PASSWORD/LAB", SECRETS).out
-    raw = re.sub(rb"\\([0-9A-Fa-f]{2})", lambda found: bytes([int(found[1], 16)]), dump.strip().encode())
-    return raw.rstrip(b"\0").decode()
 
 
 def fail_at_every_step(machine, lab, canary, answers):
@@ -253,6 +111,98 @@ def test_the_password_is_nowhere(appliance, lab, canary):
     assert sampler.check(own) == set()
     cores = [path for path, _ in files_written(appliance, since) if re.search(r"/core(\.\d+)?$", path)]
     assert cores == []
+
+
+def server(machine):
+    return next(process for process in programs(machine, "vornd") if process.arguments[1:2] != ["--task"])
+
+
+def steps_begun(machine):
+    return [step["name"] for step in json.loads(machine.read("/run/vorn/join_steps.json") or b'{"steps": []}')["steps"]]
+
+
+def test_every_program_that_a_join_begins(appliance, lab, canary):
+    """None lives too briefly to be seen: each is stopped before its first instruction. And amid the steps that know the
+    password no file holds it."""
+    give_rights(lab)
+    since = time.time() - 20
+    answers = []
+    call = threading.Thread(daemon=True, target=lambda: answers.append(
+        appliance.client.join("lab.test", "canary", canary.text)))
+    with ExecWatch(server(appliance)) as watch:
+        call.start()
+        for step, name in (("credentials", "vornjoin"), ("join", "net")):
+            with contextlib.ExitStack() as stopped:
+                # Of a controller near by, the first of these steps would be over before it is seen.
+                with lab.fault("slow", "dc1", only=appliance.host) if name == "vornjoin" else contextlib.nullcontext():
+                    appliance.wait_until(lambda: step in steps_begun(appliance) and programs(appliance, name), 30, step)
+                    stopped.enter_context(held(lambda: programs(appliance, "vornjoin", "net", "timeout")))
+                assert steps_begun(appliance)[-1] == step
+                assert where(appliance, since, canary.middle) == []
+        call.join(60)
+        assert answers and answers[0].ok, appliance.ctl("steps").text
+        own = machine_password(appliance)
+        left = appliance.client.call(DIRECTORY, 1, "leave", {
+            "delete_account": True, "username": "canary", "password": canary.text})
+        assert left.ok, left.body
+    names = [program["arguments"][0].rpartition("/")[2] for program in watch.begun if program["arguments"]]
+    assert names.count("vornjoin") == 2 and names.count("net") >= 4, names
+    assert "net" in check_programs(watch.begun, canary.middle)
+    assert check_programs(watch.begun, own) == set()
+
+
+@pytest.fixture
+def nt4_canary(lab):
+    """An account of NT4DOM that may join."""
+    made = Canary()
+    script = """set -e
+        useradd --no-create-home --home-dir /nonexistent --shell /usr/sbin/nologin --gid domusers -G domadmins canary
+        cat | smbpasswd -s -a canary"""
+    result = lab.exec("pdc", "sh", "-c", script, input=f"{made.text}\n{made.text}\n", deadline=30)
+    assert result.code == 0, result
+    yield made
+    lab.exec("pdc", "sh", "-c", "smbpasswd -x canary; userdel canary", deadline=30)
+
+
+# Samba's tool, but that it waits before it joins, and says so.
+WAITING = """cat >"$1" <<'SCRIPT'
+#!/bin/bash
+if [[ " $* " == *" join "* ]]; then
+    echo "$$" >/tmp/waiting
+    while [ ! -e /tmp/go ]; do PASSWD= sleep 0.02; done
+fi
+exec -a net /usr/bin/net.kept "$@"
+SCRIPT
+"""
+
+
+def test_a_join_of_the_old_style_through_the_door(appliance, nt4_canary):
+    since = time.time() - 20
+    door = Door(appliance)
+    door.start()
+    try:
+        visitor = door.login()
+        answers = []
+        call = threading.Thread(daemon=True, target=lambda: answers.append(visitor.call(DOMAIN, 1, "set", {
+            "enable_domain": True, "domain_name": "NT4DOM", "username": "canary", "password": nt4_canary.text})))
+        with replaced(appliance, "/usr/bin/net", WAITING), ExecWatch(server(appliance)) as watch:
+            call.start()
+            appliance.wait_until(lambda: appliance.exists("/tmp/waiting"), 30, "the join's tool")
+            assert where(appliance, since, nt4_canary.middle) == []
+            appliance.write("/tmp/go", "")
+            appliance.wait_until(lambda: programs(appliance, "net.kept") or not call.is_alive(), 30, "its work")
+            with held(lambda: programs(appliance, "net.kept", "vornjoin")):
+                assert where(appliance, since, nt4_canary.middle) == []
+            call.join(60)
+        record = appliance.client.call(DIRECTORY, 1, "join_steps").data
+        assert answers and answers[0].ok, record["steps"]
+        seen = check_programs([program for program in watch.begun if program["program"] != "/usr/bin/bash"],
+                              nt4_canary.middle)
+        assert {"net.kept", "rpcclient"} <= seen, seen
+        assert where(appliance, since, nt4_canary.middle) == []
+        assert nt4_canary.middle not in json.dumps(answers[0].body) + json.dumps(record) + door.log()
+    finally:
+        door.end()
 
 
 def test_what_is_looked_for_would_be_found(appliance, canary):

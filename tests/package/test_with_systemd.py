@@ -186,6 +186,83 @@ def test_a_service_that_hangs_is_started_anew(installed, unit):
         installed.must("systemctl", "restart", unit)
 
 
+def cursor(machine):
+    """Where the journal ends at this moment."""
+    return re.search(r"^-- cursor: (.+)$", machine.must("journalctl", "--lines", "0", "--show-cursor"), re.MULTILINE)[1]
+
+
+def journal_since(machine, place, *words):
+    return machine.must("journalctl", "--no-pager", "--output", "short", "--after-cursor", place, *words)
+
+
+def test_an_option_reloads_the_file_server_through_the_sandbox(installed):
+    place = cursor(installed)
+    smbd = installed.unit("smbd.service", "MainPID")["MainPID"]
+    installed.must("vornctl", "options", "--server-signing", "on")
+    until(lambda: "Reloaded smbd.service" in journal_since(installed, place, "--unit", "smbd.service"), 20,
+          "smbd is reloaded")
+    assert "server signing = if_required" in installed.must("testparm", "-s", "/usr/vorn/etc/smb.conf")
+    assert is_active(installed, "smbd.service") == "active"
+    assert installed.unit("smbd.service", "MainPID")["MainPID"] == smbd
+    errors = journal_since(installed, place, "--unit", "vornd.service", "--priority", "err")
+    assert "vorn" not in errors, errors
+
+
+# Stands in for one of Samba's programs: what runs it, and how the programs end there.
+LOOK = """#!/bin/sh
+exec >>/run/vorn/looked 2>&1
+grep -E '^(Seccomp|NoNewPrivs):' /proc/self/status
+for program in "/usr/bin/nmblookup.real $*" "/usr/bin/net --version" "/usr/bin/wbinfo --version" \\
+    "/usr/bin/rpcclient --version" "/usr/sbin/smbd --version"; do
+    $program >/dev/null 2>&1
+    echo "${program%% *} $?"
+done
+exit 1
+"""
+
+
+def test_a_join_runs_sambas_programs_inside_the_sandbox(installed):
+    place = cursor(installed)
+    installed.must("mv", "/usr/bin/nmblookup", "/usr/bin/nmblookup.real")
+    try:
+        installed.path("/usr/bin/nmblookup").write_text(LOOK, encoding="ascii")
+        installed.must("chmod", "755", "/usr/bin/nmblookup")
+        result = installed.run("vornctl", "--json", "join", "nowhere.test", "--user", "Administrator",
+                               "--password-stdin", input="Secret.77\n", deadline=120)
+    finally:
+        installed.must("mv", "-T", "/usr/bin/nmblookup.real", "/usr/bin/nmblookup")
+    told = journal_since(installed, place, "--unit", "vornd.service")
+    assert result.code == 1 and json.loads(result.text)["error"]["code"] == 2605, (result, told)
+    assert "discover: failed" in told, told
+    # Nobody answers here, so the first one ends with 1; none is refused or killed.
+    looked = installed.path("/run/vorn/looked").read_text(encoding="ascii").split("\n")
+    assert looked[:-1] == ["NoNewPrivs:\t1", "Seccomp:\t2", "/usr/bin/nmblookup.real 1", "/usr/bin/net 0",
+                           "/usr/bin/wbinfo 0", "/usr/bin/rpcclient 0", "/usr/sbin/smbd 0"], (looked, told)
+
+
+def test_who_is_no_member_leaves_without_a_complaint(installed):
+    place = cursor(installed)
+    result = installed.run("vornctl", "leave", "--yes")
+    assert result.code == 0, result
+    errors = journal_since(installed, place, "--unit", "vornd.service", "--priority", "warning")
+    assert "vorn" not in errors, errors
+
+
+def test_vornd_ends_in_order_after_calls(installed):
+    # Each goes into a module, and with that into the libraries that are unloaded at the end.
+    for words in (["status"], ["options"], ["schedule"], ["list"], ["events"]):
+        installed.run("vornctl", *words)
+    place = cursor(installed)
+    installed.must("systemctl", "stop", "vornd.service")
+    shown = installed.unit("vornd.service", "ActiveState", "Result", "ExecMainCode", "ExecMainStatus")
+    assert shown == {"ActiveState": "inactive", "Result": "success", "ExecMainCode": "1", "ExecMainStatus": "0"}
+    told = journal_since(installed, place, "--unit", "vornd.service")
+    assert re.search(r"vornd\[\d+\]: ended$", told, re.MULTILINE) and "signal" not in told.replace(
+        "ending on signal 15", ""), told
+    installed.must("systemctl", "start", "vornd.service")
+    installed.must("vornctl", "status")
+
+
 def test_the_page_is_served_anew_when_its_package_goes_and_comes(installed, packages):
     installed.must("dpkg", "--remove", "vorn-console")
     until(lambda: "404" in installed.curl("--output", "/dev/null", "--write-out", "%{http_code}",

@@ -244,7 +244,12 @@ export const answers = {
             .some(({user, password}) => user === parameters.username && password === parameters.password)) {
             throw failure(2607);
         }
-        await runSteps(this, "leave", this.state.member.domain_name);
+        const {hostName, member} = this.state;
+        await runSteps(this, "leave", member.domain_name);
+        if (!parameters.delete_account) {
+            const account = `the computer account ${hostName}$ stays in the domain ${member.domain_name}`;
+            this.state.steps.leftovers.push(account);
+        }
         this.state.member = null;
     },
 
