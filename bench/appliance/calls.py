@@ -88,6 +88,14 @@ def measure_socket(machine, findings, details, runs, state):
     details.add(f"a method that does nothing, {state}", Values(nothings, "µs"))
 
 
+STATUS = "`vornctl status`, which calls \"get\""
+TEST = "`vornctl test`, which calls \"test_dc\""
+REALM = "`realm list`"
+TESTJOIN = "`net ads testjoin`"
+ADCLI = "`adcli testjoin`"
+COMPARED = ((STATUS, REALM), (STATUS, TESTJOIN), (TEST, TESTJOIN), (TEST, ADCLI))
+
+
 def administrators_commands(machine):
     """What tells of the membership on a machine. `realm` asks a service on the message bus, which runs in the host."""
     machine.must("cp", CONFIGURATION, "/etc/samba/smb.conf")  # realmd knows no other place
@@ -96,11 +104,11 @@ def administrators_commands(machine):
     environment = {"LC_ALL": "C", "PATH": "/usr/sbin:/usr/bin:/sbin:/bin:/usr/vorn/bin"}
     net = ["net", f"--configfile={CONFIGURATION}", "ads", "testjoin"]
     return {
-        "`vornctl status`, which calls \"get\"": {"words": ["vornctl", "status"], "environment": environment},
-        "`realm list`": {"words": ["realm", "list"], "environment": environment},
-        "`vornctl test`, which calls \"test_dc\"": {"words": ["vornctl", "test"], "environment": environment},
-        "`net ads testjoin`": {"words": net, "environment": environment},
-        "`adcli testjoin`": {"words": ["adcli", "testjoin", f"--domain={DOMAIN_NAME}"], "environment": environment},
+        STATUS: {"words": ["vornctl", "status"], "environment": environment},
+        REALM: {"words": ["realm", "list"], "environment": environment},
+        TEST: {"words": ["vornctl", "test"], "environment": environment},
+        TESTJOIN: {"words": net, "environment": environment},
+        ADCLI: {"words": ["adcli", "testjoin", f"--domain={DOMAIN_NAME}"], "environment": environment},
     }
 
 
@@ -121,4 +129,9 @@ def measure(machine, findings, options, say):
     measured = machine.time(administrators_commands(machine), rounds=2 * options.runs, deadline=DEADLINE)
     for name, runs in measured.items():
         commands.add(name, Values([run["seconds"] for run in runs], "ms"))
+    ratios = findings.table_of("The same in pairs of one round, the first in times of the second", "pair")
+    for first, second in COMPARED:
+        pair = zip(measured[first], measured[second])
+        ratios.add(f"{first.split(',')[0]} against {second}",
+                   Values([one["seconds"] / other["seconds"] for one, other in pair], "times"))
     say("commands: " + ", ".join(f"{name} {values.median * 1000:.0f} ms" for name, values in commands.rows))

@@ -4,7 +4,8 @@ import statistics
 
 from tables import number, table
 
-# A shared machine's times vary; what is missed by less than this is reported but fails nothing.
+# A shared machine's times vary: a median that misses by less than this is reported but fails nothing. Where the worst
+# one counts, what is wanted is a promise to those who wait, and to miss it at all is a failure.
 MARGIN = 2.0
 
 # For each unit: digits shown, and what the values are multiplied with for that.
@@ -50,6 +51,8 @@ class Figure:
             return "WRONG: " + self.wrong
         if self.measured <= self.limit:
             return "met"
+        if self.worst:
+            return "BROKEN PROMISE"
         return "missed" if self.measured <= MARGIN * self.limit else "MISSED BY FAR"
 
     @property
