@@ -7,6 +7,7 @@
 #include <ctime>
 #include <filesystem>
 
+#include "appliance/base/clock.h"
 #include "appliance/base/file.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
@@ -171,7 +172,7 @@ std::optional<EntryPage> ReadEntries(EntryKind kind, std::string_view domain, st
 }
 
 int RemoveLists(const std::vector<std::string>& except, std::chrono::seconds age) {
-    const std::time_t stored = std::time(nullptr) - age.count();
+    const std::time_t stored = TimeNow() - age.count();
     int removed = 0;
     bool failed = false;
     for (const ListInfo& list : ListNames()) {

@@ -9,6 +9,7 @@
 #include <memory>
 #include <optional>
 
+#include "appliance/base/clock.h"
 #include "appliance/base/file.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
@@ -106,7 +107,7 @@ std::optional<std::time_t> StartingSince() {
     if (lstat(Path(kRefreshProgress).c_str(), &record) == 0 && !IsBefore(record.st_mtim, marker.st_mtim)) {
         return std::nullopt;
     }
-    const std::time_t age = time(nullptr) - marker.st_mtime;
+    const std::time_t age = TimeNow() - marker.st_mtime;
     return age >= 0 && age < kStartTime ? std::optional(marker.st_mtime) : std::nullopt;
 }
 

@@ -19,7 +19,7 @@ std::error_code ChangeTrustSetting(bool enabled);
 // A join has succeeded: what was changed ahead of it stays.
 void KeepProvisionalChanges();
 
-// The changes that were made before `before` (seconds since 1970) and are neither kept nor put back, one line each;
+// The changes that were made before `before` (as of TimeNow) and are neither kept nor put back, one line each;
 // afterwards they count as kept. Only while no join runs.
 std::vector<std::string> TakeProvisionalChanges(std::time_t before);
 

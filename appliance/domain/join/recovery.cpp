@@ -7,6 +7,7 @@
 #include <system_error>
 #include <thread>
 
+#include "appliance/base/clock.h"
 #include "appliance/base/command.h"
 #include "appliance/base/file_lock.h"
 #include "appliance/base/log.h"
@@ -312,7 +313,7 @@ void RecoverInBackground(Wanted wanted) {
 }
 
 Recovery RecoverInterruptedJoin(milliseconds patience) {
-    Recovery recovery = RecoverAndName(patience, Wanted::Either, std::time(nullptr));
+    Recovery recovery = RecoverAndName(patience, Wanted::Either, TimeNow());
     if (recovery.result == Result::Running || recovery.result == Result::Pending) {
         RecoverInBackground(Wanted::Either);
     }
@@ -324,7 +325,7 @@ void RecoverWhenPossible(Wanted wanted) {
     if (!only) {
         return;
     }
-    const std::time_t began = std::time(nullptr);
+    const std::time_t began = TimeNow();
     const TimeBudget all(kBackgroundTime);
     milliseconds pause = kFirstPause;
     while (!all.Over()) {
