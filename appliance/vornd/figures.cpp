@@ -85,7 +85,8 @@ std::string ListFigures(const std::string& ownDomain) {
         const Lists& lists = kinds[index];
         const std::string kind = std::string("kind=\"") + (index == 0 ? "user" : "group") + "\"";
         const auto age = [&](const char* of, std::int64_t fetched) {
-            return "vorn_list_age_seconds{" + kind + ",of=\"" + of + "\"} " + std::to_string(now - fetched) + "\n";
+            return "vorn_list_age_seconds{" + kind + ",of=\"" + of + "\"} " +
+                   std::to_string(std::max<std::int64_t>(0, now - fetched)) + "\n";
         };
         counts += "vorn_lists{" + kind + "} " + std::to_string(lists.count) + "\n";
         entries += "vorn_list_entries{" + kind + "} " + std::to_string(lists.entries) + "\n";

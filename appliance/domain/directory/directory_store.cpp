@@ -7,8 +7,8 @@
 #include <ctime>
 #include <filesystem>
 
-#include "appliance/base/clock.h"
 #include "appliance/base/file.h"
+#include "appliance/base/file_time.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/sqlite.h"
@@ -172,7 +172,7 @@ std::optional<EntryPage> ReadEntries(EntryKind kind, std::string_view domain, st
 }
 
 int RemoveLists(const std::vector<std::string>& except, std::chrono::seconds age) {
-    const std::time_t stored = TimeNow() - age.count();
+    const Moment stored = std::chrono::system_clock::now() - age;
     int removed = 0;
     bool failed = false;
     for (const ListInfo& list : ListNames()) {
@@ -180,7 +180,7 @@ int RemoveLists(const std::vector<std::string>& except, std::chrono::seconds age
             return EqualIgnoringCase(domain, list.domain);
         });
         struct stat file {};
-        if (stays || (stat(ListPath(list.kind, list.domain).c_str(), &file) == 0 && file.st_mtime > stored)) {
+        if (stays || (stat(ListPath(list.kind, list.domain).c_str(), &file) == 0 && WrittenAt(file) > stored)) {
             continue;
         }
         // The link first: while it exists, the list that it stands for exists, too.

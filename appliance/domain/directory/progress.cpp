@@ -9,8 +9,8 @@
 #include <memory>
 #include <optional>
 
-#include "appliance/base/clock.h"
 #include "appliance/base/file.h"
+#include "appliance/base/file_time.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/base/process.h"
@@ -23,7 +23,7 @@ constexpr std::chrono::milliseconds kInterval{200};
 constexpr mode_t kFolderMode = 0755;
 constexpr mode_t kMode = 0600;
 constexpr std::size_t kLargestRecord = std::size_t{4} << 20;
-constexpr std::time_t kStartTime = 3;  // seconds from the request of a refresh to the first record of its process
+constexpr std::chrono::seconds kStartTime{3};  // from the request of a refresh to the first record of its process
 constexpr char kEnded[] = "ended before it was done";
 
 Json::Value ThisProcess() {
@@ -93,10 +93,6 @@ Json::Value FirstRecord(std::time_t started) {
     return record;
 }
 
-bool IsBefore(const timespec& one, const timespec& other) {
-    return one.tv_sec < other.tv_sec || (one.tv_sec == other.tv_sec && one.tv_nsec < other.tv_nsec);
-}
-
 // Since when a refresh has been asked for whose process has not come to its first record yet.
 std::optional<std::time_t> StartingSince() {
     struct stat marker {};
@@ -104,11 +100,11 @@ std::optional<std::time_t> StartingSince() {
     if (lstat(Path(kUpdatingMarker).c_str(), &marker) != 0 || !S_ISREG(marker.st_mode) || marker.st_uid != 0) {
         return std::nullopt;
     }
-    if (lstat(Path(kRefreshProgress).c_str(), &record) == 0 && !IsBefore(record.st_mtim, marker.st_mtim)) {
+    if (lstat(Path(kRefreshProgress).c_str(), &record) == 0 && WrittenAt(record) >= WrittenAt(marker)) {
         return std::nullopt;
     }
-    const std::time_t age = TimeNow() - marker.st_mtime;
-    return age >= 0 && age < kStartTime ? std::optional(marker.st_mtime) : std::nullopt;
+    const auto age = std::chrono::system_clock::now() - WrittenAt(marker);
+    return age.count() >= 0 && age < kStartTime ? std::optional(marker.st_mtime) : std::nullopt;
 }
 
 }  // namespace

@@ -36,7 +36,7 @@ constexpr milliseconds kTrustWait{4000};
 constexpr milliseconds kDnsWait{4000};
 constexpr milliseconds kRecoveryWait{4000};
 constexpr milliseconds kDeleteWait{2500};
-constexpr milliseconds kBackWinbindWait{2000};
+constexpr milliseconds kBackWinbindWait{2200};
 static_assert(2 * kBackWinbindWait + kDeleteWait < kBackTime, "the launcher would end the way back before its end");
 constexpr long kMostClockDifference = 300;  // seconds; Kerberos refuses more
 

@@ -31,9 +31,9 @@ void Remove(const std::string& path) {
 }
 
 // False also when it is missing.
-bool IsOlder(const std::string& path, std::time_t moment) {
+bool IsOlder(const std::string& path, Moment moment) {
     struct stat status {};
-    return stat(Path(path).c_str(), &status) == 0 && status.st_mtime <= moment;
+    return stat(Path(path).c_str(), &status) == 0 && WrittenAt(status) <= moment;
 }
 
 std::string Joined(const std::vector<std::string>& texts) {
@@ -133,7 +133,7 @@ void KeepProvisionalChanges() {
     Remove(kResolvCopy);
 }
 
-std::vector<std::string> TakeProvisionalChanges(std::time_t before) {
+std::vector<std::string> TakeProvisionalChanges(Moment before) {
     std::vector<std::string> changes;
     if (IsOlder(kResolvCopy, before)) {
         if (const std::string dns = DnsChange(); !dns.empty()) {

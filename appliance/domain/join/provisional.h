@@ -4,10 +4,11 @@
 #ifndef VORN_APPLIANCE_DOMAIN_JOIN_PROVISIONAL_H
 #define VORN_APPLIANCE_DOMAIN_JOIN_PROVISIONAL_H
 
-#include <ctime>
 #include <string>
 #include <system_error>
 #include <vector>
+
+#include "appliance/base/file_time.h"
 
 namespace appliance {
 
@@ -19,9 +20,9 @@ std::error_code ChangeTrustSetting(bool enabled);
 // A join has succeeded: what was changed ahead of it stays.
 void KeepProvisionalChanges();
 
-// The changes that were made before `before` (as of TimeNow) and are neither kept nor put back, one line each;
+// The changes that were made before `before` and are neither kept nor put back, one line each;
 // afterwards they count as kept. Only while no join runs.
-std::vector<std::string> TakeProvisionalChanges(std::time_t before);
+std::vector<std::string> TakeProvisionalChanges(Moment before);
 
 }  // namespace appliance
 

@@ -7,9 +7,9 @@
 #include <system_error>
 #include <thread>
 
-#include "appliance/base/clock.h"
 #include "appliance/base/command.h"
 #include "appliance/base/file_lock.h"
+#include "appliance/base/file_time.h"
 #include "appliance/base/log.h"
 #include "appliance/base/paths.h"
 #include "appliance/domain/join/detached_tool.h"
@@ -264,7 +264,7 @@ Recovery RecoverUnderLock(milliseconds patience, Wanted wanted) {
 namespace {
 
 // What was changed ahead of the join before `before` is named in the log.
-Recovery RecoverAndName(milliseconds patience, Wanted wanted, std::time_t before) {
+Recovery RecoverAndName(milliseconds patience, Wanted wanted, Moment before) {
     try {
         const std::optional<FileLock> lock = FileLock::Take(Path(kJoinLock), milliseconds(0));
         if (!lock && errno == EAGAIN) {
@@ -297,7 +297,7 @@ Recovery RecoverAndName(milliseconds patience, Wanted wanted, std::time_t before
 }  // namespace
 
 Recovery RecoverOnce(milliseconds patience, Wanted wanted) {
-    return RecoverAndName(patience, wanted, 0);
+    return RecoverAndName(patience, wanted, Moment());
 }
 
 void RecoverInBackground(Wanted wanted) {
@@ -313,7 +313,7 @@ void RecoverInBackground(Wanted wanted) {
 }
 
 Recovery RecoverInterruptedJoin(milliseconds patience) {
-    Recovery recovery = RecoverAndName(patience, Wanted::Either, TimeNow());
+    Recovery recovery = RecoverAndName(patience, Wanted::Either, std::chrono::system_clock::now());
     if (recovery.result == Result::Running || recovery.result == Result::Pending) {
         RecoverInBackground(Wanted::Either);
     }
@@ -325,7 +325,7 @@ void RecoverWhenPossible(Wanted wanted) {
     if (!only) {
         return;
     }
-    const std::time_t began = TimeNow();
+    const Moment began = std::chrono::system_clock::now();
     const TimeBudget all(kBackgroundTime);
     milliseconds pause = kFirstPause;
     while (!all.Over()) {

@@ -261,7 +261,7 @@ TEST_F(CommandTest, DeadlineReapsTheProgram) {
 TEST_F(CommandTest, DeadlineOutsideAGroupEndsTheProgramAlone) {
     Command command = Shell("sleep 60 & echo $! > " + folder / "pid" + "; wait");
     command.ownGroup = false;
-    command.deadline = milliseconds(500);
+    command.deadline = milliseconds(2000);
     EXPECT_EQ(appliance::Run(command).end, End::TimedOut);
     const int pid = NumberIn(folder / "pid");
     ASSERT_GT(pid, 0);

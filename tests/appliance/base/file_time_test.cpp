@@ -1,33 +1,40 @@
+#include "appliance/base/file_time.h"
+
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 
-#include <chrono>
 #include <string>
-#include <thread>
 
-#include "appliance/base/clock.h"
 #include "tests/appliance/base/temporary_folder.h"
 
 namespace {
 
-using std::chrono::milliseconds;
+using appliance::Moment;
+using appliance::WrittenAt;
 using std::chrono::system_clock;
 
 class FileTimeTest : public appliance_test::FolderTest {};
 
-// What has just been written is never in the future, also where one second becomes the next.
-TEST_F(FileTimeTest, IsNotAheadOfTheClock) {
+// A tick is at most 10 ms long, and the kernel may stamp a file with the last one.
+constexpr std::chrono::milliseconds kTwoTicks{20};
+
+TEST_F(FileTimeTest, WhatIsWrittenIsNeverInTheFuture) {
     const std::string path = folder / "file";
-    const auto next = std::chrono::ceil<std::chrono::seconds>(system_clock::now() + milliseconds(20));
-    std::this_thread::sleep_until(next - milliseconds(10));
-    std::time_t last = 0;
-    while (last < system_clock::to_time_t(next)) {
+    const Moment end = system_clock::now() + 2 * kTwoTicks;
+    for (Moment before = system_clock::now(); before < end; before = system_clock::now()) {
         Put(path, "x");
         struct stat written = {};
         ASSERT_EQ(stat(path.c_str(), &written), 0);
-        last = written.st_mtime;
-        ASSERT_LE(last, appliance::TimeNow());
+        ASSERT_LE(WrittenAt(written), system_clock::now());
+        ASSERT_GE(WrittenAt(written), before - kTwoTicks);
     }
+}
+
+TEST_F(FileTimeTest, IsToldToTheNanosecond) {
+    struct stat file = {};
+    file.st_mtim = {1764000000, 123456789};
+    EXPECT_EQ(WrittenAt(file).time_since_epoch().count(), 1764000000123456789);
+    file.st_mtim.tv_nsec += 1;
+    EXPECT_EQ(WrittenAt(file).time_since_epoch().count(), 1764000000123456790);
 }
 
 }  // namespace

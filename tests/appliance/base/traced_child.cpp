@@ -16,6 +16,7 @@ namespace {
 bool Trace(const std::function<bool()>& work, const std::function<bool(long)>& enters) {
     const pid_t child = fork();
     if (child == 0) {
+        setsid();  // no signal of a terminal's
         ptrace(PTRACE_TRACEME, 0, nullptr, nullptr);
         raise(SIGSTOP);
         _exit(work() ? 0 : 1);

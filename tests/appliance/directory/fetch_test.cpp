@@ -177,7 +177,7 @@ TEST_F(FetchTest, GoesAwayWithItsProcessGroup) {
     }));
     EXPECT_EQ(kill(-task, SIGTERM), 0);
     EXPECT_EQ(WaitFor(task), 1000 + SIGTERM);
-    EXPECT_TRUE(Eventually([program] { return kill(program, 0) != 0; }));
+    EXPECT_TRUE(Eventually([program] { return !appliance::ProcessStart(program); }));
     EXPECT_LT(appliance::ReadPidFile(appliance::FetchPidFile(EntryKind::User)), 0);
 }
 
@@ -195,7 +195,7 @@ TEST_F(FetchTest, MayBeKilled) {
     }));
     kill(task, SIGKILL);
     EXPECT_EQ(WaitFor(task), 1000 + SIGKILL);
-    EXPECT_TRUE(Eventually([program] { return kill(program, 0) != 0; }));
+    EXPECT_TRUE(Eventually([program] { return !appliance::ProcessStart(program); }));
     const std::string data = appliance::Path(appliance::kDirectoryData);
     Put(data + "/.group_LAB.db.AbCdEf", "another fetch's");
     const auto files = [&data] {

@@ -25,9 +25,10 @@ using ::testing::MatchesRegex;
 using ::testing::StartsWith;
 
 // The one line that a start which fails ends with.
-std::string Refusal(const Tree& tree, const std::vector<std::string>& arguments = {}, int status = 1) {
+std::string Refusal(const Tree& tree, const std::vector<std::string>& arguments = {}, int status = 1,
+                    milliseconds wait = milliseconds(10000)) {
     Server server(tree, arguments, false);
-    EXPECT_EQ(server.End(), status);
+    EXPECT_EQ(server.End(wait), status);
     const std::string errors = server.Errors();
     const std::size_t last = errors.rfind("vornd: ");
     const std::string line = last == std::string::npos ? errors : errors.substr(last);
@@ -97,8 +98,10 @@ TEST(FirstStartTest, TheSettingsAreMadeUnderTheirLock) {
     fs::remove(tree.At("/etc/vorninfo.conf"));
     lock = appliance::FileLock::Take(tree.At("/etc/vorninfo.conf.lock"), milliseconds(0));
     ASSERT_TRUE(lock);
-    EXPECT_EQ(Refusal(tree), "vornd: " + tree.At("/etc/vorninfo.conf") +
-                                 " can't be made: its lock can't be had: Resource temporarily unavailable");
+    // It waits for the lock for five seconds itself.
+    EXPECT_EQ(Refusal(tree, {}, 1, milliseconds(20000)),
+              "vornd: " + tree.At("/etc/vorninfo.conf") +
+                  " can't be made: its lock can't be had: Resource temporarily unavailable");
 }
 
 TEST(FirstStartTest, KeepsWhatIsThere) {

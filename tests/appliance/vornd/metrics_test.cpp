@@ -161,6 +161,11 @@ TEST(FiguresTest, OfAWorkgroupAndOfAMember) {
     EXPECT_THAT(text, Not(HasSubstr("CANARY")));
     EXPECT_THAT(text, Not(HasSubstr("dc1")));
 
+    list("group_CANARY.db", "group", 1, -1000);
+    text = appliance::Figures().Text();
+    EXPECT_THAT(text, HasSubstr("vorn_list_age_seconds{kind=\"group\",of=\"own_domain\"} 0\n"))
+        << "the clock went back";
+
     StoreSecret(tree, "CANARY");
     appliance::Membership membership;
     ASSERT_FALSE(appliance::ReadMembership(membership));
