@@ -110,14 +110,13 @@ clear_faults() {
 signal_controller() {
     inside "$1" bash -c '
         for round in 1 2 3; do
-            for folder in /proc/[1-9]*; do
-                program=$(readlink "$folder/exe") || continue
+            while read -r folder program; do
                 case $program in
                     /usr/sbin/samba* | /usr/sbin/smbd | /usr/sbin/nmbd | /usr/sbin/winbindd | /usr/libexec/samba/* | \
                         /usr/lib/*/samba/*)
                         kill "-$1" "${folder##*/}" 2>/dev/null ;;
                 esac
-            done
+            done < <(find /proc/[1-9]*/exe -maxdepth 0 -printf "%h %l\n")
         done
         true' signal "$2" 2>/dev/null
 }

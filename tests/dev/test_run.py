@@ -152,7 +152,7 @@ def check_steps(text, expected):
 def test_the_main_job_is_shown_step_by_step(show):
     before = traces()
     shown = show("--once")
-    shown.wait_for("Join lab.test", 900)
+    shown.wait_for("Join lab.test", 400)
     assert shown.hold_networks() == 4 and shown.inhabitants()
     code = shown.end(240)
     assert code == 0, shown.text

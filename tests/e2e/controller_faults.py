@@ -10,7 +10,7 @@ import time
 
 from client import DIRECTORY, DOMAIN
 from conftest import remove_computer
-from lab import password
+from lab import DeadlinePassed, password
 from obstacles import replaced
 from processes import held, programs
 
@@ -18,6 +18,7 @@ GET_SECONDS = 0.1
 ASK_SECONDS = 15
 SET_SECONDS = 30
 REFRESH_SECONDS = 60
+SETTLED_SECONDS = 100
 
 
 def administrator(domain):
@@ -72,14 +73,18 @@ class Calls:
     def end(self):
         """The answers, when all have come."""
         seconds = []
-        while not all(call.done() for call in self.running.values()):
-            answer = self.machine.client.call(DOMAIN, 1, "get")
-            assert answer.ok
-            seconds.append(answer.seconds)
-            time.sleep(0.05)
-        # Other work of this machine may hold up some.
+        try:
+            while not all(call.done() for call in self.running.values()):
+                answer = self.machine.client.call(DOMAIN, 1, "get")
+                assert answer.ok
+                seconds.append(answer.seconds)
+                time.sleep(0.05)
+        finally:
+            concurrent.futures.wait(self.running.values(), 150)  # none goes on beside the next test
+        # Other work of this machine may hold up some; of a short series, up to half.
         late = [took for took in seconds if took >= GET_SECONDS]
-        assert len(late) <= 1 + len(seconds) // 10, (len(seconds), late)
+        few = len(seconds) < 20
+        assert len(late) <= (max(1, len(seconds) // 2) if few else 1 + len(seconds) // 10), (len(seconds), late)
         answers = {name: call.result() for name, call in self.running.items()}
         if "refresh" in answers:
             answers["refresh"], took = answers["refresh"]
@@ -118,6 +123,17 @@ def record_of(machine):
 
 def failed_step(machine):
     return next((step["name"] for step in record_of(machine)["steps"] if step["outcome"] == "failed"), None)
+
+
+def wait_for_winbind(machine):
+    """Samba's programs leave a controller alone for a minute that did not answer them, and ask it again then."""
+    def trusts():
+        try:
+            return machine.exec("wbinfo", "-t", deadline=10).code == 0
+        except DeadlinePassed:
+            return False
+
+    machine.wait_until(trusts, SETTLED_SECONDS, "winbind")
 
 
 def tools(machine):

@@ -98,13 +98,18 @@ class ExecWatch:
         self.watcher = subprocess.Popen([sys.executable, __file__, str(self.pid)], stdin=subprocess.PIPE,
                                         stdout=subprocess.PIPE)
         assert self.watcher.stdout.readline() == b"ready\n"
+        # Read at once: with a full pipe the watcher would stand still, and all that it follows.
+        self.lines = []
+        self.reader = threading.Thread(target=lambda: self.lines.extend(self.watcher.stdout), daemon=True)
+        self.reader.start()
         return self
 
     def __exit__(self, *_):
-        out, _ = self.watcher.communicate(timeout=20)
-        lines = out.splitlines()
-        assert lines and lines[-1] == b"done" and self.watcher.returncode == 0, out
-        self.begun = [json.loads(line) for line in lines[:-1]]
+        self.watcher.stdin.close()
+        code = self.watcher.wait(20)
+        self.reader.join(20)
+        assert self.lines and self.lines[-1] == b"done\n" and code == 0, (code, self.lines)
+        self.begun = [json.loads(line) for line in self.lines[:-1]]
 
 
 def same(one, other):

@@ -77,15 +77,22 @@ class Call(threading.Thread):
         super().__init__(daemon=True)
         self.function = lambda: function(*words, **more)
         self.answer = None
+        self.failure = None
         self.start()
 
     def run(self):
-        with contextlib.suppress(ConnectionError, OSError):
+        try:
             self.answer = self.function()
+        except OSError:
+            pass
+        except Exception as error:  # it is the caller's, not this thread's
+            self.failure = error
 
     def wait(self):
         self.join(60)
         assert not self.is_alive(), "the call of a killed server hangs"
+        if self.failure:
+            raise self.failure
         return self.answer
 
 

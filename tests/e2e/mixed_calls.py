@@ -28,6 +28,8 @@ SCHEDULES = [
 CLIENTS = 8
 LONGEST_ANSWER = 30
 LONGEST_JOIN = 60
+# A join has twenty seconds in all, and eight clients beside it on a slow machine may take them.
+OUT_OF_TIME = (2601, 2605, 2613, 2614, 2615, 2617)
 
 
 def at_once(*functions):
@@ -178,15 +180,19 @@ class Calls:
         self.call(api, 1, method, words, refused=code)
 
     def failing_join(self, _):
-        self.call(DOMAIN, 1, "set", {
-            "enable_domain": True, "domain_name": "lab.test", "username": "nobody-here", "password": "x"}, refused=2607)
-
+        answer = self.call(DOMAIN, 1, "set", {
+            "enable_domain": True, "domain_name": "lab.test", "username": "nobody-here", "password": "x"},
+            codes=(2607, *OUT_OF_TIME))
+        self.expect(not answer.ok, "joined by nobody")
 
     def join_again(self):
         self.joining += 1
-        answer = self.call(DOMAIN, 1, "set", {
-            "enable_domain": True, "domain_name": "lab.test", "username": ADMINISTRATOR[0],
-            "password": ADMINISTRATOR[1]}, longest=LONGEST_JOIN)
+        for _ in range(3):
+            answer = self.call(DOMAIN, 1, "set", {
+                "enable_domain": True, "domain_name": "lab.test", "username": ADMINISTRATOR[0],
+                "password": ADMINISTRATOR[1]}, codes=OUT_OF_TIME, longest=LONGEST_JOIN)
+            if answer.ok:
+                break
         self.joining += 1
         self.expect(answer.ok, "joined again")
 

@@ -149,15 +149,20 @@ def check_refresh(machine, task, alone):
     return marker
 
 
-def test_a_killed_refresh(member):
+def seconds_of_a_refresh(machine):
     started = time.monotonic()
-    assert member.client.refresh().data == {"status": "finish"}
-    whole = time.monotonic() - started
-    wait_for_tasks(member)
+    assert machine.client.refresh().data == {"status": "finish"}
+    seconds = time.monotonic() - started
+    wait_for_tasks(machine)
+    return seconds
+
+
+def test_a_killed_refresh(member):
+    whole = min(seconds_of_a_refresh(member) for _ in range(4))  # the first one finds nothing known
     tried = Points(member)
     markers = 0
     # Moments all over the refresh, until enough of them were in it.
-    while tried.hits < 20 and len(tried.seen) < 40:
+    while tried.hits < 20 and len(tried.seen) < 60:
         number = len(tried.seen)
         victims = "server" if number % 3 == 2 else "everything"
         offset = whole * (number * 0.618 % 1)

@@ -7,7 +7,8 @@ import pytest
 
 from appliance import Appliance, Directory
 from controller_faults import (
-    Calls, Join, administrator, as_new, failed_step, fault, on_all, record_of, remove_nt4_computer, strike, tools)
+    SETTLED_SECONDS, Calls, Join, administrator, as_new, failed_step, fault, on_all, record_of, remove_nt4_computer, strike,
+    tools, wait_for_winbind)
 from processes import held
 
 HOSTS = ("nas1", "nas2")
@@ -97,8 +98,8 @@ def members(lab, joined_machines):
 
 def wait_for_no_journal(machine):
     """What no controller could tell during the join is found out as soon as one is back."""
-    machine.wait_until(lambda: machine.exec("find", "/usr/vorn/etc/private/join", "-type", "f").out == "", 60,
-                       "the end of the journal")
+    machine.wait_until(lambda: machine.exec("find", "/usr/vorn/etc/private/join", "-type", "f").out == "",
+                       SETTLED_SECONDS, "the end of the journal")
 
 
 OTHER = ("other.test", "OTHER", "dc2")
@@ -130,7 +131,7 @@ def test_a_members_join_that_fails_late_leaves_it_a_member(lab, members, step, c
         assert machine.exists(keytab)
         assert machine.client.test_dc() is True, machine.syslog()[-3000:]
         assert machine.client.get()["domain_name"] == "LAB"
-        machine.wait_until(lambda m=machine: m.exec("wbinfo", "-t").code == 0, 60, "winbind")
+        wait_for_winbind(machine)
         assert machine.client.domains(1) == ["LAB", "OTHER"]
         wait_for_no_journal(machine)
 
@@ -163,7 +164,7 @@ def test_a_controller_that_dies_while_it_is_told_the_new_password(lab, joined_ma
         answer = calls.end()["set"]
         assert (failed_step(machine), answer.code) == ("join", 2617), record_of(machine)
     # Without a call and without a start of anything.
-    machine.wait_until(lambda: settled(machine), 60, "a membership that works, or none")
+    machine.wait_until(lambda: settled(machine), SETTLED_SECONDS, "a membership that works, or none")
     wait_for_no_journal(machine)
     if not machine.client.get()["enable_domain"]:
         # What the ended tool had sent, to disable the account on its way back, may reach the controller only now.

@@ -158,6 +158,7 @@ def test_eight_clients(member, seconds):
     assert not calls.failures, "\n".join(calls.failures)
     assert sum(calls.counts.values()) > 5 * seconds
     assert calls.done == every_method(member) - NOT_DONE
+    assert any(code == 2607 for _, code in calls.counts), "no join has failed"
     assert smbinfo.wrong == set()
     assert len(smbinfo.seen) >= 2 and smbinfo.looks > 20 * seconds
 
@@ -176,17 +177,13 @@ def test_eight_clients(member, seconds):
 
 def test_it_is_a_member_for_every_library_of_the_server(member):
     """Two modules and the server read the machine's secret, each with code of its own, at the same time."""
-    end = time.monotonic() + 5
     asked = {"get": (DOMAIN, lambda data: data["enable_domain"]),
              "overview": (DIRECTORY, lambda data: data["computer_account"])}
 
     def ask(method):
         api, is_member = asked[method]
-        answers = []
-        while time.monotonic() < end:
-            answers.append(bool(is_member(member.client.call(api, 1, method).data)))
-        return answers
+        return [bool(is_member(member.client.call(api, 1, method).data)) for _ in range(500)]
 
     with concurrent.futures.ThreadPoolExecutor(8) as pool:
         answers = [answer for each in pool.map(ask, list(asked) * 4) for answer in each]
-    assert len(answers) > 1000 and answers.count(False) == 0, (len(answers), answers.count(False))
+    assert len(answers) == 4000 and answers.count(False) == 0, answers.count(False)

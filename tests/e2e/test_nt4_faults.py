@@ -7,7 +7,8 @@ import pytest
 
 from appliance import Appliance
 from controller_faults import (
-    SET_SECONDS, Calls, Join, administrator, failed_step, fault, lists, record_of, remove_nt4_computer, strike)
+    SET_SECONDS, Calls, Join, administrator, failed_step, fault, lists, record_of, remove_nt4_computer, strike,
+    wait_for_winbind)
 from processes import programs
 
 KNOWN = ["NT4DOM"]
@@ -162,7 +163,7 @@ def test_a_controller_that_dies_in_the_middle_of_two_joins(lab, member, newcomer
     assert newcomer.client.join(*JOIN).ok, newcomer.ctl("steps").text
     assert newcomer.client.test_dc() is True
     assert member.client.get()["domain_name"] == "NT4DOM"
-    member.wait_until(lambda: member.exec("wbinfo", "-t").code == 0, 60, "winbind")
+    wait_for_winbind(member)
     assert_well(member)
 
 

@@ -212,7 +212,7 @@ def test_a_clock_that_differs_is_set_to_the_controllers(member):
     def refusals():
         """By how many seconds the clock was to be set; a second may end between the two looks. Cron may look, too."""
         found = re.findall(CANT_BE_SET, "\n".join(log.lines))
-        return list(dict.fromkeys(round(int(ahead), -1) for ahead in found))
+        return list(dict.fromkeys(round(int(ahead), -2) for ahead in found))
 
     log = Log(member)
     for process in programs(member, "vornd"):

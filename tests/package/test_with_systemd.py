@@ -192,6 +192,7 @@ def cursor(machine):
 
 
 def journal_since(machine, place, *words):
+    machine.must("journalctl", "--sync")  # else what a program told before it ended may not be there yet
     return machine.must("journalctl", "--no-pager", "--output", "short", "--after-cursor", place, *words)
 
 
