@@ -86,7 +86,7 @@ TEST_F(PollingTest, RunsToItsEnd) {
 }
 
 TEST_F(PollingTest, PublishesProgressInOrder) {
-    const std::string id = Start("TaskSteps", Object({{"steps", 20}, {"pause", 30}}));
+    const std::string id = Start("TaskSteps", Object({{"steps", 20}, {"pause", 100}}));
     int last = 0;
     int seen = 0;
     for (Json::Value status = Status(id); !status["finish"].asBool(); status = Status(id)) {
