@@ -3,6 +3,8 @@
 #include <signal.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 #include "machine_test.h"
 
 using contract::kLock;
@@ -60,7 +62,7 @@ TEST_F(Locks, AreTakenAndGivenBack) {
 }
 
 TEST_F(Locks, ShutOutOtherProcesses) {
-    const pid_t holder = Holder(milliseconds(1000));
+    const pid_t holder = Holder(milliseconds(3000));
     EXPECT_NE(FAILING(VLIBCFileLock(kLock, 0)), 0);
     EXPECT_FALSE(ProcessGets(0));
     EXPECT_EQ(contract::Await(holder), 0);
@@ -83,8 +85,12 @@ TEST_F(Locks, TheLowestByteDoesNotCountWhenGivenBack) {
 TEST_F(Locks, WaitAsLongAsTheyWereAskedTo) {
     const pid_t holder = Holder(milliseconds(60000));
     int result = 0;
-    EXPECT_LT(TimeOf([&] { result = FAILING(VLIBCFileLock(kLock, 0)); }), milliseconds(900));
-    EXPECT_NE(result, 0);
+    milliseconds none{60000};
+    for (int attempt = 0; attempt < 3; ++attempt) {
+        none = std::min(none, TimeOf([&] { result = FAILING(VLIBCFileLock(kLock, 0)); }));
+        EXPECT_NE(result, 0);
+    }
+    EXPECT_LT(none, milliseconds(900));
     const milliseconds second = TimeOf([&] { result = FAILING(VLIBCFileLock(kLock, 1)); });
     EXPECT_NE(result, 0);
     EXPECT_GE(second, milliseconds(900));
@@ -94,7 +100,7 @@ TEST_F(Locks, WaitAsLongAsTheyWereAskedTo) {
 }
 
 TEST_F(Locks, WaitNoLongerThanTheyHaveTo) {
-    const pid_t holder = Holder(milliseconds(500));
+    const pid_t holder = Holder(milliseconds(3000));
     int result = -2;
     EXPECT_LT(TimeOf([&] { result = VLIBCFileLock(kLock, 30); }), milliseconds(10000));
     EXPECT_EQ(result, 0);

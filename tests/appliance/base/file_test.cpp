@@ -156,21 +156,23 @@ TEST_F(FileTest, ReadersSeeOneContentOrTheOther) {
     const std::string second(70000, 'b');
     ASSERT_FALSE(ReplaceFile(path, first));
     const pid_t writer = appliance_test::Fork([&] {
-        for (int turn = 0; turn < 150; ++turn) {
+        for (int turn = 0; access((folder / "enough").c_str(), F_OK) != 0; ++turn) {
             if (ReplaceFile(path, turn % 2 == 0 ? second : first)) {
                 return false;
             }
         }
         return true;
     });
-    int seen = 0;
-    while (waitpid(writer, nullptr, WNOHANG) == 0) {
+    int seen[] = {0, 0};
+    while (seen[0] < 50 || seen[1] < 50) {
         std::string content;
         ASSERT_FALSE(ReadFile(path, content));
         ASSERT_TRUE(content == first || content == second);
-        ++seen;
+        ++seen[content == first ? 0 : 1];
     }
-    EXPECT_GT(seen, 10);
+    Put(folder / "enough", "");
+    EXPECT_EQ(appliance_test::WaitFor(writer), 0);
+    unlink((folder / "enough").c_str());
     EXPECT_THAT(folder.Names(), ElementsAre("file"));
 }
 

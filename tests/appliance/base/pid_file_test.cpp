@@ -53,15 +53,21 @@ TEST_F(PidFileTest, Processes) {
 }
 
 TEST_F(PidFileTest, StartOfAProcess) {
-    timespec before = {};
-    clock_gettime(CLOCK_REALTIME, &before);
+    const auto now = [] {
+        timespec time = {};
+        clock_gettime(CLOCK_REALTIME, &time);
+        return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) / 1e9;
+    };
+    const double before = now();
     const pid_t child = Fork([] {
         pause();
         return true;
     });
+    const double after = now();
     const auto start = appliance::ProcessStartTime(child);
     ASSERT_TRUE(start);
-    EXPECT_NEAR(*start, static_cast<double>(before.tv_sec) + static_cast<double>(before.tv_nsec) / 1e9, 0.5);
+    EXPECT_GE(*start, before - 0.05);
+    EXPECT_LE(*start, after + 0.05);
     EXPECT_GE(*ProcessStart(child), *ProcessStart(getpid()));
     kill(child, SIGKILL);
     WaitFor(child);

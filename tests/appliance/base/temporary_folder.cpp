@@ -74,7 +74,7 @@ int WaitFor(pid_t child) {
 }
 
 bool Eventually(const std::function<bool()>& holds) {
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(30);
     while (!holds()) {
         if (std::chrono::steady_clock::now() > end) {
             return false;

@@ -17,7 +17,7 @@ using appliance::RidOfSid;
 using std::chrono::milliseconds;
 using Page = FakeLdapServer::Page;
 
-constexpr milliseconds kPatience{400};
+constexpr milliseconds kPatience{20000};
 
 struct Outcome {
     int entries = 0;
@@ -67,9 +67,9 @@ TEST(LdapSessionTest, EndsWithAServerThatStalls) {
     for (const Page end : {Page::Stall, Page::Silence}) {
         FakeLdapServer server(3, {Page::More, end});
         const auto started = std::chrono::steady_clock::now();
-        const Outcome outcome = SearchAt(server.port());
+        const Outcome outcome = SearchAt(server.port(), milliseconds(400));
         EXPECT_EQ(outcome.code, ErrorCode::TimedOut) << outcome.failure;
-        EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(5));
+        EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(15));
     }
 }
 

@@ -93,12 +93,12 @@ TEST(WorkerTest, IsPatientWithProgressButNotForEver) {
         };
     };
     std::vector<std::int64_t> counts;
-    const Json::Value value = RunWorker({milliseconds(600), milliseconds(20000)}, slow(8),
+    const Json::Value value = RunWorker({milliseconds(2000), milliseconds(20000)}, slow(16),
                                         [&counts](std::int64_t count) { counts.push_back(count); });
     EXPECT_EQ(value.asString(), "done");
-    EXPECT_EQ(counts.size(), 8u);
-    EXPECT_EQ(counts.back(), 8);
-    EXPECT_EQ(FailureOf({milliseconds(600), milliseconds(1000)}, slow(1000)).first, "not done within 1 s");
+    EXPECT_EQ(counts.size(), 16u);
+    EXPECT_EQ(counts.back(), 16);
+    EXPECT_EQ(FailureOf({milliseconds(2000), milliseconds(1000)}, slow(1000)).first, "not done within 1 s");
 }
 
 TEST(WorkerTest, TellsOfManySmallStepsOnlyNowAndThen) {

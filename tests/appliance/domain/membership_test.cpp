@@ -234,7 +234,7 @@ TEST_F(Operations, AHangingControllerDoesNotHoldUpTheTestForEver) {
     Tool("/usr/bin/net", "sleep 100");
     const auto began = std::chrono::steady_clock::now();
     EXPECT_EQ(VORNWinTestJoin(1), -1);
-    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(14));
+    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(25));
 }
 
 TEST_F(Operations, TheTrustedDomainSettingIsStored) {

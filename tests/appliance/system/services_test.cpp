@@ -44,7 +44,7 @@ trap 'echo "$name HUP" >> "$root/record"' HUP
 trap 'echo "$name TERM" >> "$root/record"; rm "$root/run/samba/$name.pid"; sleep 0.1; exit 0' TERM
 if [ -e "$root/stubborn-$name" ]; then trap '' TERM; fi
 echo $$ > "$root/run/samba/$name.pid"
-if [ -e "$root/short-$name" ]; then sleep 0.05; exit 0; fi
+if [ -e "$root/short-$name" ]; then exec sleep 0.02; fi
 while [ -e "$root/daemon" ]; do sleep 0.02; done
 )";
 
@@ -106,7 +106,7 @@ protected:
     // What was asked since the last look, as soon as there are `count` lines of it.
     std::vector<std::string> Record(std::size_t count = 0) {
         std::vector<std::string> lines;
-        for (int round = 0; round < 200; ++round) {
+        for (int round = 0; round < 1000; ++round) {
             lines.clear();
             std::ifstream file(At("/record"));
             for (std::string line; std::getline(file, line);) {
@@ -227,7 +227,7 @@ TEST_F(Services, ThatEndRightAwayHaveFailed) {
     }
     Put("/silent-smbd", "");
     const auto start = std::chrono::steady_clock::now();
-    EXPECT_EQ(appliance::StartService("samba", milliseconds(500)).failure, ErrorCode::CommandFailed);
+    EXPECT_EQ(appliance::StartService("samba", milliseconds(2000)).failure, ErrorCode::CommandFailed);
     EXPECT_LT(std::chrono::steady_clock::now() - start, milliseconds(3000));
 }
 

@@ -305,7 +305,8 @@ TEST_F(PollingTest, AStartThatFailsLeavesNoRecord) {
 
 TEST_F(PollingTest, OneThatIsStoppedBeforeItBeginsWasStarted) {
     // Its process comes so late that the record is a stopped one's by then.
-    const TaskHost host{host_.database, {"/bin/sh", "-c", "sleep 1; exit 1"}};
+    const TaskHost host{host_.database,
+                        {"/bin/sh", "-c", "while ! [ -e \"$0\" ]; do sleep 0.01; done; exit 1", tree_.At("/stopped")}};
     request_.impl->taskHost = &host;
     std::thread stop([this] {
         Json::Value groups(Json::arrayValue);
@@ -314,6 +315,7 @@ TEST_F(PollingTest, OneThatIsStoppedBeforeItBeginsWasStarted) {
         EXPECT_TRUE(Eventually(
             [&] { return VORN::APIPolling(&request_).List("Test", groups, tasks) && tasks["admin"].size() == 1; }));
         EXPECT_TRUE(Stop(tasks["admin"][0].asString()));
+        tree_.Write("/stopped", "");
     });
     const std::string id = Start("TaskSteps");
     stop.join();

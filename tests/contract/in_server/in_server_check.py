@@ -187,7 +187,7 @@ class InServer(unittest.TestCase):
         self.assertEqual(2, self.end_of(self.start("steps", steps=2, pause=0, late=True))["data"]["step"])
 
     def test_a_task_shows_its_progress(self):
-        task = self.start("steps", steps=3, pause=400)
+        task = self.start("steps", steps=3, pause=2000)
         status = self.until(task, lambda status: status["data"] and status["data"]["step"] >= 1)
         self.assertIs(status["finish"], False)
         self.assertIs(status["success"], True)
