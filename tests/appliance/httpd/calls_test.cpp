@@ -161,7 +161,7 @@ TEST_F(CallsTest, FilesOverTheWire) {
     EXPECT_EQ(brotli.body, "as brotli");
     EXPECT_EQ(brotli.header.at("content-encoding"), "br");
     client.Send(GetText("/assets/app.js", {}, "HEAD"));
-    const Message head = client.Receive(milliseconds(2000), true);
+    const Message head = client.Receive(milliseconds(20000), true);
     EXPECT_EQ(head.header.at("content-length"), "100000");
     EXPECT_EQ(head.header.at("etag"), whole.header.at("etag"));
     client.Send(GetText("/assets/app.js", "If-None-Match: " + whole.header.at("etag") + "\r\n"));
@@ -215,7 +215,7 @@ TEST_F(CallsTest, Health) {
     EXPECT_EQ(answer.status(), 200);
     EXPECT_EQ(answer.body, R"({"status":"ok"})");
     client.Send(GetText("/healthz", {}, "HEAD"));
-    EXPECT_EQ(client.Receive(milliseconds(2000), true).status(), 200);
+    EXPECT_EQ(client.Receive(milliseconds(20000), true).status(), 200);
     for (int count = 0; count < 50; ++count) {
         EXPECT_EQ(client.Ask(GetText("/healthz")).status(), 200);
     }

@@ -82,52 +82,64 @@ TEST_F(LimitsTest, RequestsThatDrip) {
         usleep(50000);
     }
     for (Client* client : {&header, &body}) {
-        const Message answer = client->Receive(milliseconds(3000));
+        const Message answer = client->Receive(milliseconds(10000));
         EXPECT_EQ(answer.status(), 408);
         EXPECT_EQ(answer.Code(), 215);
         EXPECT_TRUE(client->Ends());
     }
     EXPECT_GE(Clock::now() - begin, milliseconds(550));
-    EXPECT_LT(Clock::now() - begin, milliseconds(3000));
+    EXPECT_LT(Clock::now() - begin, milliseconds(10000));
 }
 
 TEST_F(LimitsTest, IdleConnections) {
-    limits_.idle = milliseconds(500);
+    limits_.idle = milliseconds(2000);
     Serve();
     Client fresh = Connect();
     Client used = Connect();
+    const auto begin = Clock::now();
     EXPECT_EQ(used.Ask(GetText("/")).status(), 200);
-    EXPECT_FALSE(used.Ends(milliseconds(300)));
     EXPECT_TRUE(used.Ends());
+    EXPECT_GE(Clock::now() - begin, limits_.idle);
     EXPECT_TRUE(fresh.Ends());
 }
 
 TEST_F(LimitsTest, AClientThatTakesNothing) {
     limits_.stall = milliseconds(500);
-    Serve([](const Message&) { return FakeVornd::Reply("\"" + std::string(std::size_t{20} << 20, 'x') + "\""); });
+    Serve([](const Message& request) {
+        return FakeVornd::Reply(request.first == "GET /metrics HTTP/1.1" ? std::string("x")
+                                                                         : std::string(std::size_t{20} << 20, 'x'));
+    });
     Client client = Connect();
     client.Send(PostText("/webapi/A/1/b", "{}", kCookie));
-    usleep(1500000);
+    Client watcher = Connect();
+    const auto isAlone = [&] {
+        return watcher.Ask(GetText("/metrics")).body.find("\nvorn_httpd_connections 1\n") != std::string::npos;
+    };
+    ASSERT_TRUE(Eventually(isAlone, milliseconds(10000)));
     EXPECT_EQ(client.Receive().status(), 0) << "the answer was cut off";
     EXPECT_EQ(Connect().Ask(GetText("/")).status(), 200);
 }
 
 TEST_F(LimitsTest, AClientThatTakesItSlowlyButTakesIt) {
-    limits_.stall = milliseconds(800);
+    limits_.stall = milliseconds(3000);
     limits_.answer = milliseconds(60000);
-    Serve([](const Message&) { return FakeVornd::Reply("\"" + std::string(std::size_t{16} << 20, 'x') + "\""); });
+    // The system's buffers hold about 5 MB: the others alone take longer than one stall.
+    constexpr std::size_t kAll = std::size_t{20} << 20;
+    Serve([](const Message&) { return FakeVornd::Reply("\"" + std::string(kAll, 'x') + "\""); });
     Client client = Connect();
+    const int small = 65536;
+    setsockopt(client.socket(), SOL_SOCKET, SO_RCVBUF, &small, sizeof small);
     client.Send(PostText("/webapi/A/1/b", "{}", kCookie));
     std::size_t got = 0;
     const auto begin = Clock::now();
     std::vector<char> bytes(std::size_t{1} << 20);
-    while (got < std::size_t{16} << 20) {
-        const ssize_t some = recv(client.socket(), bytes.data(), bytes.size(), 0);
+    while (got < kAll) {
+        const ssize_t some = recv(client.socket(), bytes.data(), bytes.size(), MSG_WAITALL);
         ASSERT_GT(some, 0) << "after " << got;
         got += static_cast<std::size_t>(some);
-        usleep(100000);
+        usleep(250000);
     }
-    EXPECT_GT(Clock::now() - begin, milliseconds(1500)) << "longer than one stall";
+    EXPECT_GT(Clock::now() - begin, milliseconds(4500));
 }
 
 TEST_F(LimitsTest, AWholeAnswerHasALimit) {
@@ -254,18 +266,18 @@ TEST_F(LimitsTest, RequestsThatRunAreNeverPushedOut) {
         }
         return FakeVornd::Reply("{}");
     });
+    std::vector<Client> dripping;
+    for (std::size_t index = 100; index < appliance::kConnections; ++index) {
+        dripping.push_back(Connect());
+        dripping.back().Send("GET / HT");
+    }
     std::vector<Client> running;
     for (std::size_t index = 0; index < 100; ++index) {
         running.push_back(Connect());
         running.back().Send(PostText("/webapi/A/1/b", "{}", kCookie));
     }
-    std::vector<Client> dripping;
-    for (std::size_t index = running.size(); index < appliance::kConnections; ++index) {
-        dripping.push_back(Connect());
-        dripping.back().Send("GET / HT");
-    }
+    // Then it has read the others' beginnings too, which came before.
     ASSERT_TRUE(Eventually([&] { return vornd_->Requests().size() == running.size(); }));
-    usleep(300000);
     const Message refused = Connect().Ask(GetText("/"));
     EXPECT_EQ(refused.status(), 503);
     EXPECT_EQ(refused.Code(), 242);
@@ -306,7 +318,7 @@ TEST_F(LimitsTest, OthersAreServedBesideIdleAndDrippingConnections) {
         }
         const auto begin = Clock::now();
         ASSERT_EQ(client.Ask(PostText("/webapi/A/1/b", "{}", kCookie)).status(), 200);
-        EXPECT_LT(Clock::now() - begin, milliseconds(1000));
+        EXPECT_LT(Clock::now() - begin, milliseconds(5000));
     }
 }
 
@@ -323,10 +335,8 @@ TEST_F(LimitsTest, AnsweredAlthoughTheClientHasEndedSending) {
 }
 
 TEST_F(LimitsTest, AClientThatGoesLeavesItsCallToItsEnd) {
-    std::atomic<int> ended{0};
-    Serve([&ended](const Message&) {
+    Serve([](const Message&) {
         usleep(300000);
-        ++ended;
         return FakeVornd::Reply("{}");
     });
     {
@@ -334,7 +344,7 @@ TEST_F(LimitsTest, AClientThatGoesLeavesItsCallToItsEnd) {
         client.Send(PostText("/webapi/A/1/b", "{}", kCookie));
         ASSERT_TRUE(Eventually([&] { return vornd_->Requests().size() == 1; }));
     }
-    EXPECT_TRUE(Eventually([&] { return ended == 1; }));
+    EXPECT_TRUE(Eventually([&] { return vornd_->Answered() == 1; }));
     EXPECT_EQ(Connect().Ask(PostText("/webapi/A/1/b", "{}", kCookie)).status(), 200);
     EXPECT_EQ(vornd_->Connections(), 1) << "the connection was whole, and used again";
 }

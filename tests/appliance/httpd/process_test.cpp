@@ -133,7 +133,7 @@ TEST_F(ProcessTest, TheLogHasNoSecrets) {
     EXPECT_THAT(output, Not(HasSubstr("secret")));
     EXPECT_THAT(output, HasSubstr(": 127.0.0.1 POST /session/login 200 "));
     EXPECT_THAT(output, HasSubstr(": 127.0.0.1 POST /webapi/A/1/set 200 "));
-    EXPECT_THAT(output, HasSubstr(": 127.0.0.1 GET / 200 34 bytes 0 ms\n"));
+    EXPECT_THAT(output, ::testing::ContainsRegex(": 127\\.0\\.0\\.1 GET / 200 34 bytes [0-9]+ ms\n"));
     EXPECT_THAT(output, HasSubstr(": 127.0.0.1 GET /webapi 404 "));
     EXPECT_EQ(output.find('\x1B'), std::string::npos);
 }
@@ -201,7 +201,7 @@ TEST_F(ProcessTest, RunningRequestsAreAnsweredAndOthersRefused) {
     Client sending = Connect(door);
     sending.Send("GET / HTTP/1.1\r\n");
     ASSERT_TRUE(Eventually([&] { return vornd_->Requests().size() == 1; }));
-    usleep(100000);
+    EXPECT_EQ(Connect(door).Ask(GetText("/")).status(), 200) << "and the half request was there before";
     door.Signal(SIGTERM);
     const Message refused = sending.Receive();
     EXPECT_EQ(refused.status(), 503);
@@ -228,7 +228,7 @@ TEST_F(ProcessTest, ASecondSignalEndsItAtOnce) {
     door.Signal(SIGTERM);
     ASSERT_TRUE(Eventually([&] { return door.Output().find("ending on signal") != std::string::npos; }));
     door.Signal(SIGTERM);
-    EXPECT_EQ(door.End(milliseconds(2000)), 1);
+    EXPECT_EQ(door.End(milliseconds(10000)), 1);
     go = true;
     vornd_.reset();
 }

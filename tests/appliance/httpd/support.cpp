@@ -203,6 +203,7 @@ void FakeVornd::ServeOne(int socket) {
             }
             sent += static_cast<std::size_t>(some);
         }
+        ++answered_;
     }
     const std::lock_guard<std::mutex> guard(mutex_);
     open_.erase(std::find(open_.begin(), open_.end(), socket));

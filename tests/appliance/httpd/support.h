@@ -81,6 +81,10 @@ public:
     int Connections() const {
         return connections_;
     }
+    // How many answers have been sent, or cut off by the other side.
+    int Answered() const {
+        return answered_;
+    }
     // Ends the connections that wait for a request; new ones are taken as before.
     void DropIdle();
 
@@ -96,6 +100,7 @@ private:
     std::vector<int> open_;
     std::vector<std::thread> threads_;
     std::atomic<int> connections_{0};
+    std::atomic<int> answered_{0};
     std::atomic<bool> ending_{false};
     std::thread server_;
 };
@@ -144,7 +149,7 @@ public:
     }
     void Signal(int signal) const;
     // The exit status, 128 + N for a signal; nothing when it does not end within `wait`.
-    std::optional<int> End(milliseconds wait = milliseconds(10000));
+    std::optional<int> End(milliseconds wait = milliseconds(30000));
     // What it has printed so far.
     std::string Output() const;
 
@@ -181,7 +186,7 @@ public:
     // The next answer; an empty one after `wait` or at the end of the connection. `noBody` for answers to HEAD.
     Message Receive(milliseconds wait = milliseconds(20000), bool noBody = false);
     // True when the other side closes within `wait` and sends nothing more.
-    bool Ends(milliseconds wait = milliseconds(3000));
+    bool Ends(milliseconds wait = milliseconds(10000));
     void CloseSending();
     // One request and its answer.
     Message Ask(const std::string& request);
@@ -205,7 +210,7 @@ inline const std::string kCookie = "Cookie: __Host-vorn=" + kToken + "\r\n";
 
 // Asks again and again until `condition` holds; false when it does not within `wait`.
 template <typename Condition>
-bool Eventually(Condition condition, milliseconds wait = milliseconds(10000)) {
+bool Eventually(Condition condition, milliseconds wait = milliseconds(30000)) {
     const auto end = std::chrono::steady_clock::now() + wait;
     while (!condition()) {
         if (std::chrono::steady_clock::now() >= end) {

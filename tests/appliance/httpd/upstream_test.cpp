@@ -53,10 +53,11 @@ TEST_F(UpstreamTest, ConnectionsAreUsedAgain) {
 }
 
 TEST_F(UpstreamTest, AwayIsSaidAtOnce) {
+    limits_.upstreamConnect = milliseconds(60000);
     StartDoor();
     const auto begin = Clock::now();
     ExpectUnreachable(Post());
-    EXPECT_LT(Clock::now() - begin, milliseconds(1000));
+    EXPECT_LT(Clock::now() - begin, milliseconds(10000));
     StartVornd();
     EXPECT_EQ(Post().status(), 200) << "and it may come back";
 }
@@ -123,7 +124,7 @@ TEST_F(UpstreamTest, AQuestionIsNotAskedForEver) {
 
 TEST_F(UpstreamTest, Nonsense) {
     std::string answer;
-    limits_.upstreamCall = milliseconds(1000);  // what might go on is waited for
+    limits_.upstreamCall = milliseconds(3000);  // what might go on is waited for
     Serve([&answer](const Message&) { return answer; });
     const std::string ok = "HTTP/1.1 200 OK\r\n";
     const std::string json = "Content-Type: application/json\r\n";
@@ -192,7 +193,7 @@ TEST_F(UpstreamTest, ChunkedAnswersAndThoseThatEndTheConnection) {
 }
 
 TEST_F(UpstreamTest, CallsHaveADeadline) {
-    limits_.upstreamCall = milliseconds(600);
+    limits_.upstreamCall = milliseconds(3000);
     std::atomic<bool> go{false};
     Serve([&go](const Message&) {
         Eventually([&go] { return go.load(); });
@@ -200,8 +201,8 @@ TEST_F(UpstreamTest, CallsHaveADeadline) {
     });
     const auto begin = Clock::now();
     ExpectUnreachable(Post());
-    EXPECT_GE(Clock::now() - begin, milliseconds(550));
-    EXPECT_LT(Clock::now() - begin, milliseconds(3000));
+    EXPECT_GE(Clock::now() - begin, milliseconds(2950));
+    EXPECT_LT(Clock::now() - begin, milliseconds(12000));
     go = true;
     EXPECT_EQ(Post().body, "\"late\"") << "of its own request";
     EXPECT_EQ(vornd_->Connections(), 2);
@@ -209,7 +210,7 @@ TEST_F(UpstreamTest, CallsHaveADeadline) {
 }
 
 TEST_F(UpstreamTest, AProbeHasAShorterOne) {
-    limits_.upstreamProbe = milliseconds(500);
+    limits_.upstreamProbe = milliseconds(3000);
     std::atomic<bool> go{false};
     Serve([&go](const Message&) {
         Eventually([&go] { return go.load(); });
@@ -219,13 +220,14 @@ TEST_F(UpstreamTest, AProbeHasAShorterOne) {
     ExpectUnreachable(Client(door_->port()).Ask(GetText("/healthz")));
     const Message metrics = Client(door_->port()).Ask(GetText("/metrics"));
     EXPECT_THAT(metrics.body, ::testing::HasSubstr("\nvorn_up 0\n"));
-    EXPECT_LT(Clock::now() - begin, milliseconds(3000));
+    EXPECT_GE(Clock::now() - begin, milliseconds(5900)) << "two of them";
+    EXPECT_LT(Clock::now() - begin, milliseconds(15000));
     go = true;
     vornd_.reset();
 }
 
 TEST_F(UpstreamTest, NobodyTakesTheConnection) {
-    limits_.upstreamConnect = milliseconds(700);
+    limits_.upstreamConnect = milliseconds(3000);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     const std::string path = folder_.At("vornd.sock");
@@ -241,8 +243,8 @@ TEST_F(UpstreamTest, NobodyTakesTheConnection) {
     StartDoor();
     const auto begin = Clock::now();
     ExpectUnreachable(Post());
-    EXPECT_GE(Clock::now() - begin, milliseconds(650));
-    EXPECT_LT(Clock::now() - begin, milliseconds(3000));
+    EXPECT_GE(Clock::now() - begin, milliseconds(2950));
+    EXPECT_LT(Clock::now() - begin, milliseconds(15000));
 }
 
 TEST_F(UpstreamTest, NotMoreAtATimeThanVorndHasRoomFor) {
@@ -275,7 +277,7 @@ TEST_F(UpstreamTest, AnswersInMemoryHaveALimit) {
         slow.emplace_back(door_->port());
         slow.back().Send(PostText("/webapi/A/1/b", "{}", kCookie));
     }
-    usleep(1500000);
+    ASSERT_TRUE(Eventually([this] { return vornd_->Answered() == 5; }));
     int whole = 0;
     int refused = 0;
     for (Client& client : slow) {
