@@ -134,14 +134,14 @@ TEST_F(ConnectionsTest, GivesASlowSenderFifteenSeconds) {
         }
     });
     for (Client* client : {&header, &body}) {
-        const Response response = client->Receive();
+        const Response response = client->Receive(milliseconds(30000));
         EXPECT_EQ(response.status, 408);
         EXPECT_EQ(response.Code(), 215);
     }
     drip.join();
     const auto took = std::chrono::duration_cast<milliseconds>(steady_clock::now() - begin).count();
     EXPECT_GT(took, 14500);
-    EXPECT_LT(took, 17000);
+    EXPECT_LT(took, 25000);
     idle.Send(PostText("nothing", "{}"));
     EXPECT_EQ(idle.Receive().status, 200) << "a connection without a request may wait";
 }
@@ -165,13 +165,15 @@ TEST_F(ConnectionsTest, TheOldestIdleConnectionMakesRoom) {
 
 TEST_F(ConnectionsTest, ConnectionsThatAreBusyDoNotMakeRoom) {
     std::vector<Client> clients;
-    for (std::size_t index = 0; index < appliance::kConnections; ++index) {
+    for (std::size_t index = 1; index < appliance::kConnections; ++index) {
         clients.push_back(server_.Connect());
         clients.back().Send("POST /");
     }
-    // Once their first bytes have been seen they are busy.
-    ASSERT_TRUE(Eventually([&] { return server_.Descriptors() > static_cast<int>(appliance::kConnections); }));
-    usleep(200000);
+    const std::string file = tree_.At("/tmp/running");
+    clients.push_back(server_.Connect());
+    clients.back().Send(PostText("sleep", R"({"milliseconds": 15000, "file": ")" + file + "\"}"));
+    // Once the last one's call runs, the first bytes of those before it have been seen: they are busy.
+    ASSERT_TRUE(Eventually([&] { return PidsIn(file).size() == 1; }));
     Client late = server_.Connect();
     const Response refused = late.Receive();
     EXPECT_EQ(refused.status, 503);
@@ -182,7 +184,7 @@ TEST_F(ConnectionsTest, ConnectionsThatAreBusyDoNotMakeRoom) {
 
 TEST_F(ConnectionsTest, RefusesCallsWhenSixtyFourWait) {
     const std::string file = tree_.At("/tmp/running");
-    const std::string call = PostText("sleep", R"({"milliseconds": 3000, "file": ")" + file + "\"}");
+    const std::string call = PostText("sleep", R"({"milliseconds": 6000, "file": ")" + file + "\"}");
     std::vector<Client> clients;
     for (std::size_t index = 0; index < appliance::kWorkers; ++index) {
         clients.push_back(server_.Connect());
@@ -193,7 +195,8 @@ TEST_F(ConnectionsTest, RefusesCallsWhenSixtyFourWait) {
         clients.push_back(server_.Connect());
         clients.back().Send(PostText("nothing", "{}"));
     }
-    usleep(300000);
+    const std::string full = "vorn_calls_waiting " + std::to_string(appliance::kWaitingCalls) + "\n";
+    ASSERT_TRUE(Eventually([&] { return server_.Figures().find(full) != std::string::npos; }));
     for (int index = 0; index < 5; ++index) {
         const Response refused = server_.Call("nothing");
         EXPECT_EQ(refused.status, 503);
@@ -201,7 +204,7 @@ TEST_F(ConnectionsTest, RefusesCallsWhenSixtyFourWait) {
     }
     Client list = server_.Connect();
     list.Send("GET /webapi HTTP/1.1\r\nHost: x\r\n\r\n");
-    EXPECT_EQ(list.Receive(milliseconds(1000)).status, 200) << "what needs no module never waits";
+    EXPECT_EQ(list.Receive(milliseconds(4000)).status, 200) << "what needs no module never waits";
     for (Client& client : clients) {
         EXPECT_EQ(client.Receive().status, 200);
     }
@@ -219,27 +222,26 @@ TEST_F(ConnectionsTest, AClientThatGoesAwayDuringItsCallHarmsNobody) {
 TEST_F(ConnectionsTest, EightClientsLeaveNothingOpen) {
     server_.Call("nothing");
     const int before = server_.Descriptors();
-    const auto end = steady_clock::now() + std::chrono::seconds(3);
+    constexpr int kThreads = 8;
+    constexpr int kRounds = 300;
     std::atomic<int> right{0};
-    std::atomic<int> wrong{0};
     std::vector<std::thread> threads;
-    for (int index = 0; index < 8; ++index) {
+    for (int index = 0; index < kThreads; ++index) {
         threads.emplace_back([&, index] {
-            for (int round = index; steady_clock::now() < end; ++round) {
+            for (int round = index; round < index + kRounds; ++round) {
                 Client client = server_.Connect();
                 const bool refused = round % 5 == 0;
                 client.Send(round % 3 == 0 ? PostText("throw", "{}") : PostText("nothing", refused ? "{" : "{}"));
                 const int status = client.Receive().status;
                 const int expected = round % 3 == 0 ? 500 : refused ? 400 : 200;
-                ++(status == expected ? right : wrong);
+                right += status == expected ? 1 : 0;
             }
         });
     }
     for (std::thread& thread : threads) {
         thread.join();
     }
-    EXPECT_GT(right, 200);
-    EXPECT_EQ(wrong, 0);
+    EXPECT_EQ(right, kThreads * kRounds);
     EXPECT_TRUE(Eventually([&] { return server_.Descriptors() <= before; })) << before << " " << server_.Descriptors();
 }
 

@@ -15,8 +15,13 @@ tr '\0' '\n' | {
     printf '%s:%s\n' "$user" "$password" >>"$VORN_TEST_ROOT/asked"
     case $password in
         right) exit 0 ;;
-        right-slow) sleep 1; exit 0 ;;
-        slow) sleep 3; exit 10 ;;
+        right-slow)
+            for _ in $(seq 1000); do
+                test -e "$VORN_TEST_ROOT/go" && exit 0
+                sleep 0.03
+            done
+            ;;
+        slow) sleep 2.1; exit 10 ;;
         unknown) exit 11 ;;
         refused) exit 12 ;;
         no-administrator) exit 13 ;;

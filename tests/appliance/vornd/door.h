@@ -29,7 +29,7 @@ struct Headers {
 class DoorTest : public ::testing::Test {
 protected:
     // The password is the verdict: right, wrong, unknown, refused, no-administrator, broken, killed; slow is wrong after
-    // 3 s and right-slow right after 1 s.
+    // 2.1 s, and right-slow right once there is the file /go.
     DoorTest();
 
     void Restart();

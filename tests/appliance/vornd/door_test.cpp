@@ -148,8 +148,10 @@ TEST_F(DoorTest, ADamagedFileOfSessionsEndsThemAndNothingElse) {
 TEST_F(DoorTest, TheAnswerOfACallIsWithheldWhenItsSessionHasEnded) {
     const Headers headers = Session();
     Client client = server_->Connect(kDoorUser);
-    client.Send(RequestText("POST", "/webapi/Test.Plain/1/sleep", R"({"milliseconds":1500})", headers.Text()));
-    usleep(300000);
+    const std::string file = tree_.At("/tmp/running");
+    const std::string body = R"({"milliseconds":4000,"file":")" + file + "\"}";
+    client.Send(RequestText("POST", "/webapi/Test.Plain/1/sleep", body, headers.Text()));
+    ASSERT_TRUE(Eventually([&] { return PidsIn(file).size() == 1; }));
     EXPECT_EQ(Ask("POST", "/session/logout", {}, headers).status, 200);
     EXPECT_EQ(client.Receive(milliseconds(500)).status, 0) << "the call goes on";
     ExpectError(client.Receive(), 401, 220);
@@ -201,15 +203,20 @@ TEST_F(DoorTest, OtherRequestsOnItsConnectionAreInNoSession) {
 
 TEST_F(DoorTest, NeverTakesTheAdministratorsConnections) {
     std::vector<Client> doors;
-    for (std::size_t count = 0; count < appliance::kDoorConnections; ++count) {
+    for (std::size_t count = 1; count < appliance::kDoorConnections; ++count) {
         doors.push_back(server_->Connect(kDoorUser));
         doors.back().Send("POST /session/login HTTP/1.1\r\n");  // busy for 15 s
     }
-    usleep(300000);
+    doors.push_back(server_->Connect(kDoorUser));
+    doors.back().Send(RequestText("POST", "/session/login", R"({"user":"anna","password":"right-slow"})", ""));
+    // Once the last one's request has been taken, those before it are busy, too.
+    ASSERT_TRUE(Eventually([this] { return tree_.Read("/asked") == "anna:right-slow\n"; }));
     Client more = server_->Connect(kDoorUser);
     more.Send(RequestText("GET", "/session", "", ""));
     EXPECT_EQ(more.Receive().Code(), 242);
     EXPECT_EQ(server_->Call("nothing").status, 200);
+    tree_.Write("/go", "");
+    EXPECT_EQ(doors.back().Receive().status, 200);
     doors.clear();
     EXPECT_TRUE(Eventually([this] { return Ask("GET", "/session").status == 401; }));
     for (std::size_t count = 0; count <= appliance::kDoorConnections; ++count) {

@@ -112,10 +112,10 @@ TEST_F(LoginTest, GivesUpAfterTwentySeconds) {
     const auto begin = steady_clock::now();
     Client client = server_->Connect(kDoorUser);
     client.Send(RequestText("POST", "/session/login", R"({"user":"anna","password":"right"})", ""));
-    ExpectError(client.Receive(milliseconds(25000)), 503, 225);
+    ExpectError(client.Receive(milliseconds(40000)), 503, 225);
     const auto took = duration_cast<milliseconds>(steady_clock::now() - begin);
     EXPECT_GE(took.count(), 20000);
-    EXPECT_LT(took.count(), 21500);
+    EXPECT_LT(took.count(), 30000);
     EXPECT_THAT(server_->Errors(), HasSubstr("did not end within"));
 }
 
@@ -187,30 +187,37 @@ TEST_F(LoginTest, OneAddressHasToWaitWhateverTheUsers) {
 }
 
 TEST_F(LoginTest, TwoAtATimeAndEightWait) {
+    const auto logIn = [this](std::size_t attempt) {
+        Headers headers;
+        headers.client = "198.51.100." + std::to_string(attempt);
+        return LogIn("user" + std::to_string(attempt), "right-slow", headers);
+    };
     std::vector<std::thread> threads;
-    std::vector<Response> responses(14);
-    for (std::size_t attempt = 0; attempt < responses.size(); ++attempt) {
-        threads.emplace_back([&, attempt] {
-            Headers headers;
-            headers.client = "198.51.100." + std::to_string(attempt);
-            responses[attempt] = LogIn("user" + std::to_string(attempt), "right-slow", headers);
-        });
-        usleep(10000);
+    std::vector<Response> responses(10);
+    const auto start = [&](std::size_t attempt) {
+        threads.emplace_back([&, attempt] { responses[attempt] = logIn(attempt); });
+    };
+    start(0);
+    start(1);
+    EXPECT_TRUE(Eventually([this] { return CountOf(tree_.Read("/asked"), "\n") == 2; }));
+    for (std::size_t attempt = 2; attempt < responses.size(); ++attempt) {
+        start(attempt);
+    }
+    EXPECT_TRUE(
+        Eventually([this] { return server_->Figures().find("vorn_log_ins_waiting 8\n") != std::string::npos; }));
+    for (std::size_t attempt = 10; attempt < 14; ++attempt) {
+        ExpectError(logIn(attempt), 503, 240);
     }
     // Calls have threads of their own.
     EXPECT_EQ(server_->Call("nothing").status, 200);
+    EXPECT_EQ(CountOf(tree_.Read("/asked"), "\n"), 2u);
+    tree_.Write("/go", "");
     for (std::thread& thread : threads) {
         thread.join();
     }
-    int accepted = 0;
     for (const Response& response : responses) {
-        if (response.status == 200) {
-            ++accepted;
-        } else {
-            ExpectError(response, 503, 240);
-        }
+        EXPECT_EQ(response.status, 200) << response.body;
     }
-    EXPECT_EQ(accepted, 10);
     EXPECT_EQ(LogIn("user13", "right").status, 200) << "it was no failure of the user's";
 }
 

@@ -250,7 +250,7 @@ TEST_F(MetricsOfAServerTest, AreThereWhenEveryThreadForCallsIsTaken) {
     std::vector<Client> clients;
     for (int busy = 0; busy < 20; ++busy) {
         clients.push_back(server_->Connect());
-        clients.back().Send(PostText("sleep", R"({"milliseconds":1500})"));
+        clients.back().Send(PostText("sleep", R"({"milliseconds":4000})"));
     }
     EXPECT_TRUE(Eventually(
         [this] {
@@ -258,7 +258,7 @@ TEST_F(MetricsOfAServerTest, AreThereWhenEveryThreadForCallsIsTaken) {
             return text.find("vorn_calls_running 16\n") != std::string::npos &&
                    text.find("vorn_calls_waiting 4\n") != std::string::npos;
         },
-        milliseconds(1000)));
+        milliseconds(3500)));
     EXPECT_EQ(LogIn("anna", "right").status, 200) << "and so are log-ins";
     for (Client& client : clients) {
         EXPECT_EQ(client.Receive().status, 200);

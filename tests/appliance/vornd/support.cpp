@@ -313,6 +313,12 @@ Response Server::Call(const std::string& method, const Json::Value& parameters) 
     return client.Receive();
 }
 
+std::string Server::Figures() const {
+    Client client = Connect();
+    client.Send("GET /metrics HTTP/1.1\r\nHost: localhost\r\n\r\n");
+    return client.Receive().body;
+}
+
 int Server::Descriptors() const {
     const std::string folder = "/proc/" + std::to_string(pid_) + "/fd";
     return static_cast<int>(std::distance(fs::directory_iterator(folder), fs::directory_iterator()));

@@ -102,15 +102,17 @@ public:
         return pid_;
     }
     // Waits for this state ("READY=1") on the service manager's socket.
-    bool Hears(const std::string& state, milliseconds wait = milliseconds(10000));
+    bool Hears(const std::string& state, milliseconds wait = milliseconds(30000));
     void Signal(int signal) const;
     // The exit status, 128 + N for a signal; nothing when it does not end within `wait`.
-    std::optional<int> End(milliseconds wait = milliseconds(10000));
+    std::optional<int> End(milliseconds wait = milliseconds(30000));
     // What it has printed so far.
     std::string Errors() const;
 
     // One call on a connection of its own.
     Response Call(const std::string& method, const Json::Value& parameters = Json::Value(Json::objectValue)) const;
+    // Its figures, as text.
+    std::string Figures() const;
     Client Connect(uid_t user = 0) const;
     int Descriptors() const;
 
@@ -126,7 +128,7 @@ private:
 
 // Asks again and again until `condition` holds; false when it does not within `wait`.
 template <typename Condition>
-bool Eventually(Condition condition, milliseconds wait = milliseconds(10000)) {
+bool Eventually(Condition condition, milliseconds wait = milliseconds(30000)) {
     const auto end = std::chrono::steady_clock::now() + wait;
     while (!condition()) {
         if (std::chrono::steady_clock::now() >= end) {
