@@ -30,7 +30,7 @@ deadline_of_suite() {
     case $1 in
         format | shell) say 300 ;;
         clang | corpus | library) say 900 ;;
-        lab) say 3000 ;;
+        lab) say 3600 ;;
         *) say 2400 ;;
     esac
 }

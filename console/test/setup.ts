@@ -1,6 +1,9 @@
 import '@testing-library/jest-dom/vitest';
-import { cleanup } from '@testing-library/react';
+import { cleanup, configure } from '@testing-library/react';
 import { afterEach } from 'vitest';
+
+// Some wait for the page's own timers of a second, and a busy machine adds to that.
+configure({ asyncUtilTimeout: 5000 });
 
 afterEach(() => {
   cleanup();

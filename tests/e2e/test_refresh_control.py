@@ -310,7 +310,7 @@ def test_beside_a_fetch_of_the_appliances_own(member, lab):
         assert member.exec("/usr/vorn/sbin/vornwin", "-updateDomain").code == 3
         assert fetch.end() == 0
         assert all(row["fetched"] > before[key]["fetched"] for key, row in lists(member).items())
-        assert wait_for_end(member, task, 10).data == {"status": "finish"}
+        assert wait_for_end(member, task).data == {"status": "finish"}
         assert_quiet(member)
 
 

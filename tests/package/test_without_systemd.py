@@ -105,7 +105,7 @@ def test_a_removal_waits_for_a_join_and_ends_what_can_be_ended(plain, packages):
     # Programs of the same paths that take their time.
     plain.must("cp", "/usr/bin/sleep", "/usr/vorn/sbin/vornjoin")
     plain.must("cp", "/usr/bin/sleep", "/usr/vorn/sbin/vornwin")
-    plain.start("/usr/vorn/sbin/vornjoin", "4")
+    plain.start("/usr/vorn/sbin/vornjoin", "10")
     plain.start("/usr/vorn/sbin/vornwin", "300")
     # One of a container on this machine is none of its.
     plain.start("unshare", "--pid", "--fork", "--kill-child", "/usr/vorn/sbin/vornwin", "301")

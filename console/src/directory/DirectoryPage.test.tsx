@@ -258,10 +258,11 @@ describe('a refresh', () => {
   });
 
   it('that ended before is told with its age and its errors', async () => {
+    const now = Math.floor(Date.now() / 1000);
     progress = {
       ...running({
-        started: kNow - 700,
-        updated: kNow - 600,
+        started: now - 700,
+        updated: now - 600,
         errors: [{ domain: 'OTHER', kind: 'user', reason: 'x' }],
       }),
       running: false,

@@ -44,7 +44,7 @@ export function UserMenu() {
         </MenuToggle>
       )}
     >
-      <DropdownGroup label={t('theme.label')}>
+      <DropdownGroup label={t('theme.label')} labelHeadingLevel="h2">
         <DropdownList>
           {kChoices.map((choice) => (
             <DropdownItem key={choice} isSelected={choice === chosen} onClick={() => chooseTheme(choice)}>

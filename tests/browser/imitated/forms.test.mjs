@@ -2,7 +2,7 @@
 
 import assert from "node:assert/strict";
 
-import {pause} from "../lib/fixture.mjs";
+import {pause, until} from "../lib/fixture.mjs";
 import {memberState} from "../lib/imitated_state.mjs";
 import {imitated} from "./page.mjs";
 import {expectError, expectGone, expectText} from "./views.mjs";
@@ -20,6 +20,7 @@ imitated("options: what is changed is marked, and only that is sent, once", asyn
     await expectText(page, "2 changes are not saved.");
     const release = imitation.hold("Conf.set");
     await save(page).dblclick();
+    await until("the call", () => imitation.callsOf("Conf.set").length > 0);
     await pause(200);
     assert.equal(imitation.callsOf("Conf.set").length, 1);
     release();
@@ -129,6 +130,7 @@ imitated("schedule: stored in words, changed in words, saved once", async ({page
     await expectText(page, "Every Sunday at 04:30.");
     const release = imitation.hold("Schedule.set");
     await save(page).dblclick();
+    await until("the call", () => imitation.callsOf("Schedule.set").length > 0);
     await pause(200);
     assert.equal(imitation.callsOf("Schedule.set").length, 1);
     release();

@@ -35,7 +35,7 @@ async function faultsOf(script, html = "", prepare = () => {}) {
         const page = await context.newPage();
         await page.goto(`${BASE}/`);
         await page.locator("#end").waitFor();
-        await page.evaluate(() => new Promise((done) => setTimeout(done, 200)));
+        await page.evaluate(() => new Promise((done) => setTimeout(done, 600)));
         return watch.faults.join("\n");
     } finally {
         await context.close();
