@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <ctime>
 #include <filesystem>
 
 #include "appliance/base/file.h"

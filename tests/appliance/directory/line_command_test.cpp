@@ -8,6 +8,7 @@
 #include <stdexcept>
 
 #include "appliance/base/process.h"
+#include "tests/appliance/base/temporary_folder.h"
 
 namespace appliance {
 namespace {
@@ -104,16 +105,9 @@ pid_t FirstOf(const std::vector<std::string>& lines) {
     return lines.empty() ? 0 : std::stoi(lines[0]);
 }
 
-// A moment may pass until a process that was killed is collected.
+// A moment may pass until a process ends that was killed.
 bool IsGone(pid_t pid) {
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(5);
-    while (ProcessStart(pid)) {
-        if (std::chrono::steady_clock::now() >= end) {
-            return false;
-        }
-        usleep(5000);
-    }
-    return true;
+    return appliance_test::Eventually([pid] { return !ProcessStart(pid); });
 }
 
 TEST(LineCommandTest, ItsDeadlineEndsWhatItStarted) {

@@ -62,11 +62,8 @@ real("100,000 users: the first row within a second, each search within 200 ms", 
         await expectText(page, "1 to 100 of 100,000 users");
         await picture("users-100000");
         const searches = {};
-        const answers = [];
-        page.on("response", (response) => response.url().endsWith("/users") && answers.push(response));
         const texts = ["user099999", "person 0543", "USER05", "9", "nobody at all", "son 099"];
         for (const text of Array.from({length: TRIES}, () => texts).flat()) {
-            answers.length = 0;
             const answered = page.waitForResponse((response) => response.url().endsWith("/users") &&
                 response.request().postDataJSON().search === text);
             await page.getByRole("searchbox").fill(text);
