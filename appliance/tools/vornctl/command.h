@@ -6,13 +6,10 @@
 #include <functional>
 #include <vector>
 
+#include "appliance/tools/vornctl/arguments.h"
 #include "appliance/tools/vornctl/client.h"
 #include "appliance/tools/vornctl/exit_code.h"
 #include "appliance/tools/vornctl/output.h"
-
-namespace CLI {
-class App;
-}
 
 namespace appliance::ctl {
 
@@ -29,27 +26,27 @@ using Runner = std::function<int(Context& context)>;
 struct Command {
     const char* name;
     const char* summary;
-    // Adds the command's options to its parser and returns what runs it once they are read.
-    Runner (*setUp)(CLI::App& parser);
+    // Adds the command's options to its arguments and returns what runs it once they are read.
+    Runner (*setUp)(Arguments arguments);
     bool hidden = false;
 };
 
-Runner SetUpStatus(CLI::App& parser);
-Runner SetUpJoin(CLI::App& parser);
-Runner SetUpLeave(CLI::App& parser);
-Runner SetUpTest(CLI::App& parser);
-Runner SetUpList(CLI::App& parser);
-Runner SetUpRefresh(CLI::App& parser);
-Runner SetUpOptions(CLI::App& parser);
-Runner SetUpSchedule(CLI::App& parser);
-Runner SetUpUsers(CLI::App& parser);
-Runner SetUpGroups(CLI::App& parser);
-Runner SetUpEvents(CLI::App& parser);
-Runner SetUpSteps(CLI::App& parser);
-Runner SetUpLink(CLI::App& parser);
-Runner SetUpExplain(CLI::App& parser);
-Runner SetUpCall(CLI::App& parser);
-Runner SetUpComplete(CLI::App& parser);
+Runner SetUpStatus(Arguments arguments);
+Runner SetUpJoin(Arguments arguments);
+Runner SetUpLeave(Arguments arguments);
+Runner SetUpTest(Arguments arguments);
+Runner SetUpList(Arguments arguments);
+Runner SetUpRefresh(Arguments arguments);
+Runner SetUpOptions(Arguments arguments);
+Runner SetUpSchedule(Arguments arguments);
+Runner SetUpUsers(Arguments arguments);
+Runner SetUpGroups(Arguments arguments);
+Runner SetUpEvents(Arguments arguments);
+Runner SetUpSteps(Arguments arguments);
+Runner SetUpLink(Arguments arguments);
+Runner SetUpExplain(Arguments arguments);
+Runner SetUpCall(Arguments arguments);
+Runner SetUpComplete(Arguments arguments);
 
 // In the order of the help.
 const std::vector<Command>& Commands();
@@ -60,7 +57,7 @@ struct GlobalOptions {
     bool json = false;
     int timeout = 0;  // seconds; 0: each call's own
 };
-void AddGlobalOptions(CLI::App& parser, GlobalOptions& options);
+void AddGlobalOptions(Arguments arguments, GlobalOptions& options);
 
 // Calls a method whose answer is all that the command prints. True on success, with the answer in `answer`; otherwise
 // the failure has been reported and `exitCode` set. With --json the answer has been printed either way.

@@ -2,7 +2,6 @@
 
 #include <unistd.h>
 
-#include <CLI/CLI.hpp>
 #include <cerrno>
 
 #include "appliance/tools/vornctl/command.h"
@@ -107,21 +106,18 @@ int RunCall(Context& context, const CallOptions& options) {
 
 }  // namespace
 
-Runner SetUpCall(CLI::App& parser) {
+Runner SetUpCall(Arguments arguments) {
     const auto options = std::make_shared<CallOptions>();
-    parser.add_option("API", options->api, "name of the API, for example VORN.Core.Directory.Domain")
-        ->type_name("")
-        ->required();
-    parser.add_option("VERSION", options->version, "its version")
-        ->type_name("")
-        ->check(CLI::Range(0, 2147483647).description(""))
-        ->required();
-    parser.add_option("METHOD", options->method, "the method")->type_name("")->required();
-    parser
-        .add_option("JSON", options->parameters,
-                    "the parameters, a JSON object; \"-\" reads it from standard input; {} without it")
-        ->type_name("");
-    parser.footer(
+    arguments.Text("API", options->api, "name of the API, for example VORN.Core.Directory.Domain")
+        .TypeName("")
+        .Required();
+    arguments.Number("VERSION", options->version, "its version").TypeName("").Between(0, 2147483647).Required();
+    arguments.Text("METHOD", options->method, "the method").TypeName("").Required();
+    arguments
+        .Text("JSON", options->parameters,
+              "the parameters, a JSON object; \"-\" reads it from standard input; {} without it")
+        .TypeName("");
+    arguments.Footer(
         "Prints the data of the answer. /usr/vorn/share/methods.json describes all\n"
         "methods.\n\n"
         "Example:\n"

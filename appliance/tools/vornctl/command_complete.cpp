@@ -1,6 +1,5 @@
 // vornctl __complete: what the shell's completion asks. One candidate in a line.
 
-#include <CLI/CLI.hpp>
 #include <set>
 
 #include "appliance/base/text.h"
@@ -41,29 +40,6 @@ Words DomainNames(const Client& client) {
     return {names.begin(), names.end()};
 }
 
-bool TakesValue(const CLI::Option* option) {
-    return option != nullptr && option->get_items_expected_max() > 0;
-}
-
-const CLI::App* FindCommand(const CLI::App& root, const std::string& name) {
-    for (const CLI::App* command : root.get_subcommands(nullptr)) {
-        if (command->get_name() == name) {
-            return command;
-        }
-    }
-    return nullptr;
-}
-
-Words OptionsOf(const CLI::App& parser) {
-    Words names;
-    for (const CLI::Option* option : parser.get_options()) {
-        for (const std::string& name : option->get_lnames()) {
-            names.push_back("--" + name);
-        }
-    }
-    return names;
-}
-
 // API names, then versions, then methods, by how many of the arguments are there already.
 Words CallArguments(const Words& given) {
     std::set<std::string> names;
@@ -80,21 +56,20 @@ Words CallArguments(const Words& given) {
     return {names.begin(), names.end()};
 }
 
-Words Candidates(const CLI::App& root, Context& context, const Words& words) {
-    const CLI::App* command = nullptr;
+Words Candidates(Arguments program, Context& context, const Words& words) {
+    std::optional<Arguments> command;
     std::string socket;
-    Words arguments;  // of the command
+    Words given;  // the command's arguments that are no options
     for (std::size_t i = 0; i + 1 < words.size(); ++i) {
         if (words[i] == "--socket" && i + 2 < words.size()) {
             socket = words[i + 1];
         }
         if (StartsWith(words[i], "-")) {
-            const CLI::Option* option = (command != nullptr ? *command : root).get_option_no_throw(words[i]);
-            i += TakesValue(option) ? 1U : 0U;
-        } else if (command == nullptr) {
-            command = FindCommand(root, words[i]);
+            i += command.value_or(program).TakesValue(words[i]) ? 1U : 0U;
+        } else if (!command) {
+            command = program.Command(words[i]);
         } else {
-            arguments.push_back(words[i]);
+            given.push_back(words[i]);
         }
     }
     const std::string before = words.size() > 1 ? words[words.size() - 2] : "";
@@ -104,23 +79,22 @@ Words Candidates(const CLI::App& root, Context& context, const Words& words) {
     if (before == "--domain") {
         return socket.empty() ? DomainNames(context.client) : DomainNames(Client(socket, std::chrono::seconds(0)));
     }
-    const CLI::Option* valued = (command != nullptr ? *command : root).get_option_no_throw(before);
-    if (TakesValue(valued)) {
+    if (command.value_or(program).TakesValue(before)) {
         return {};
     }
     if (StartsWith(words.back(), "-")) {
-        return OptionsOf(command != nullptr ? *command : root);
+        return command.value_or(program).LongOptions();
     }
     Words names;
-    if (command == nullptr) {
+    if (!command) {
         for (const Command& one : Commands()) {
             if (!one.hidden) {
                 names.emplace_back(one.name);
             }
         }
-    } else if (command->get_name() == "call") {
-        names = CallArguments(arguments);
-    } else if (command->get_name() == "explain" && arguments.empty()) {
+    } else if (command->Name() == "call") {
+        names = CallArguments(given);
+    } else if (command->Name() == "explain" && given.empty()) {
         for (const auto& [code, text] : ErrorTexts()) {
             names.push_back(std::to_string(code));
         }
@@ -130,15 +104,14 @@ Words Candidates(const CLI::App& root, Context& context, const Words& words) {
 
 }  // namespace
 
-Runner SetUpComplete(CLI::App& parser) {
+Runner SetUpComplete(Arguments arguments) {
     const auto words = std::make_shared<Words>();
-    parser.add_option("WORD", *words, "the words of the line, the last one being typed")->type_name("");
-    const CLI::App* const root = parser.get_parent();
-    return [words, root](Context& context) {
+    arguments.Rest("WORD", *words, "the words of the line, the last one being typed").TypeName("");
+    return [words, program = arguments.Program()](Context& context) {
         if (words->empty()) {
             words->emplace_back();
         }
-        for (const std::string& candidate : Candidates(*root, context, *words)) {
+        for (const std::string& candidate : Candidates(program, context, *words)) {
             if (StartsWith(candidate, words->back())) {
                 context.out.Line(candidate);
             }

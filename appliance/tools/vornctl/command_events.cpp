@@ -1,7 +1,5 @@
 // vornctl events
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/platform/system/event_text.h"
 #include "appliance/tools/vornctl/command.h"
 
@@ -56,15 +54,15 @@ int RunEvents(Context& context, const EventOptions& options) {
 
 }  // namespace
 
-Runner SetUpEvents(CLI::App& parser) {
+Runner SetUpEvents(Arguments arguments) {
     const auto options = std::make_shared<EventOptions>();
-    parser.add_option("--offset", options->offset, "pass over so many, the newest first")
-        ->type_name("N")
-        ->check(CLI::Range(0, 2147483647).description(""));
-    parser.add_option("--limit", options->limit, "show so many at most, 1 to 1000; 50 without it")
-        ->type_name("N")
-        ->check(CLI::Range(1, kLargestPage).description(""));
-    parser.footer("What happened to the membership, newest first.");
+    arguments.Number("--offset", options->offset, "pass over so many, the newest first")
+        .TypeName("N")
+        .Between(0, 2147483647);
+    arguments.Number("--limit", options->limit, "show so many at most, 1 to 1000; 50 without it")
+        .TypeName("N")
+        .Between(1, kLargestPage);
+    arguments.Footer("What happened to the membership, newest first.");
     return [options](Context& context) { return RunEvents(context, *options); };
 }
 

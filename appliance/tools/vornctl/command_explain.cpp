@@ -1,7 +1,5 @@
 // vornctl explain
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/catalogue.h"
 #include "appliance/tools/vornctl/command.h"
 
@@ -54,12 +52,10 @@ int RunExplain(Context& context, int code) {
 
 }  // namespace
 
-Runner SetUpExplain(CLI::App& parser) {
+Runner SetUpExplain(Arguments arguments) {
     const auto code = std::make_shared<int>(0);
-    parser.add_option("CODE", *code, "the code; without it, all codes are listed")
-        ->type_name("")
-        ->check(CLI::Range(1, 65535).description(""));
-    parser.footer("Works without the server.");
+    arguments.Number("CODE", *code, "the code; without it, all codes are listed").TypeName("").Between(1, 65535);
+    arguments.Footer("Works without the server.");
     return [code](Context& context) { return RunExplain(context, *code); };
 }
 

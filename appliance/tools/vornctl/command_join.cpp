@@ -1,7 +1,5 @@
 // vornctl join
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/base/text.h"
 #include "appliance/tools/vornctl/steps.h"
 #include "appliance/tools/vornctl/terminal.h"
@@ -104,38 +102,32 @@ int RunJoin(Context& context, const JoinOptions& options) {
 
 }  // namespace
 
-Runner SetUpJoin(CLI::App& parser) {
+Runner SetUpJoin(Arguments arguments) {
     const auto options = std::make_shared<JoinOptions>();
-    parser.add_option("DOMAIN", options->domain, "DNS or NetBIOS name of the domain, no address")
-        ->type_name("")
-        ->required();
-    parser.add_option("-u,--user", options->user, "account of the domain that may join computers")
-        ->type_name("ACCOUNT")
-        ->required();
-    parser.add_flag("--password-stdin", options->passwordFromInput,
-                    "read the password from standard input, up to the first end of line, instead of asking for it");
-    parser.add_option("--dns", options->dns, "DNS servers to use from now on, as a rule the domain's controllers")
-        ->type_name("A,B")
-        ->delimiter(',')
-        ->allow_extra_args(false);
-    parser.add_flag("--no-trusted-domains", options->noTrustedDomains, "use the users of this domain only");
-    parser.add_option("--kdc", options->kdc, "name or address of the domain controller to use")
-        ->type_name("HOST")
-        ->group("Advanced options");
-    parser.add_option("--netbios-name", options->netbiosName, "NetBIOS name of the domain, when it can't be found out")
-        ->type_name("NAME")
-        ->group("Advanced options");
-    parser.add_option("--fqdn", options->fqdn, "DNS name of the domain, when it can't be found out")
-        ->type_name("NAME")
-        ->group("Advanced options");
-    parser
-        .add_option("--interface", options->interfaces,
-                    "network interface whose addresses are registered in DNS; may be given several times")
-        ->type_name("NAME")
-        ->delimiter(',')
-        ->allow_extra_args(false)
-        ->group("Advanced options");
-    parser.footer(
+    arguments.Text("DOMAIN", options->domain, "DNS or NetBIOS name of the domain, no address").TypeName("").Required();
+    arguments.Text("-u,--user", options->user, "account of the domain that may join computers")
+        .TypeName("ACCOUNT")
+        .Required();
+    arguments.Flag("--password-stdin", options->passwordFromInput,
+                   "read the password from standard input, up to the first end of line, instead of asking for it");
+    arguments.List("--dns", options->dns, "DNS servers to use from now on, as a rule the domain's controllers")
+        .TypeName("A,B");
+    arguments.Flag("--no-trusted-domains", options->noTrustedDomains, "use the users of this domain only");
+    arguments.Text("--kdc", options->kdc, "name or address of the domain controller to use")
+        .TypeName("HOST")
+        .Group("Advanced options");
+    arguments.Text("--netbios-name", options->netbiosName, "NetBIOS name of the domain, when it can't be found out")
+        .TypeName("NAME")
+        .Group("Advanced options");
+    arguments.Text("--fqdn", options->fqdn, "DNS name of the domain, when it can't be found out")
+        .TypeName("NAME")
+        .Group("Advanced options");
+    arguments
+        .List("--interface", options->interfaces,
+              "network interface whose addresses are registered in DNS; may be given several times")
+        .TypeName("NAME")
+        .Group("Advanced options");
+    arguments.Footer(
         "The password is asked for without an echo. It is no option: other users could\n"
         "read it. A join that fails leaves everything as it was.\n\n"
         "Examples:\n"

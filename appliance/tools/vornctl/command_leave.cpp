@@ -1,7 +1,5 @@
 // vornctl leave
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/steps.h"
 #include "appliance/tools/vornctl/terminal.h"
 
@@ -139,16 +137,16 @@ int RunLeave(Context& context, const LeaveOptions& options) {
 
 }  // namespace
 
-Runner SetUpLeave(CLI::App& parser) {
+Runner SetUpLeave(Arguments arguments) {
     const auto options = std::make_shared<LeaveOptions>();
-    parser.add_flag("--delete-account", options->deleteAccount,
-                    "delete the appliance's computer account on the domain controller, too");
-    parser.add_option("-u,--user", options->user, "account of the domain that may delete it, with --delete-account")
-        ->type_name("ACCOUNT");
-    parser.add_flag("--password-stdin", options->passwordFromInput,
-                    "read that account's password from standard input instead of asking for it");
-    parser.add_flag("-y,--yes", options->yes, "leave without asking");
-    parser.footer(
+    arguments.Flag("--delete-account", options->deleteAccount,
+                   "delete the appliance's computer account on the domain controller, too");
+    arguments.Text("-u,--user", options->user, "account of the domain that may delete it, with --delete-account")
+        .TypeName("ACCOUNT");
+    arguments.Flag("--password-stdin", options->passwordFromInput,
+                   "read that account's password from standard input instead of asking for it");
+    arguments.Flag("-y,--yes", options->yes, "leave without asking");
+    arguments.Footer(
         "Leaving needs no password and works also when no controller answers. The\n"
         "computer account then stays on the controller; its name is printed.\n\n"
         "Examples:\n"

@@ -1,6 +1,5 @@
 // vornctl link
 
-#include <CLI/CLI.hpp>
 #include <algorithm>
 
 #include "appliance/base/text.h"
@@ -63,10 +62,10 @@ int RunLink(Context& context, const std::string& address) {
 
 }  // namespace
 
-Runner SetUpLink(CLI::App& parser) {
+Runner SetUpLink(Arguments arguments) {
     const auto address = std::make_shared<std::string>();
-    parser.add_option("--address", *address, "the page's address, to print the link whole")->type_name("URL");
-    parser.footer(
+    arguments.Text("--address", *address, "the page's address, to print the link whole").TypeName("URL");
+    arguments.Footer(
         "A link that logs in to the appliance's page as root, once and within 10 minutes.\n"
         "Whoever has it first is in: hand it on as carefully as a password.");
     return [address](Context& context) { return RunLink(context, *address); };

@@ -1,7 +1,5 @@
 // vornctl list
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {
@@ -62,10 +60,10 @@ int RunList(Context& context, bool version1) {
 
 }  // namespace
 
-Runner SetUpList(CLI::App& parser) {
+Runner SetUpList(Arguments arguments) {
     const auto version1 = std::make_shared<bool>(false);
-    parser.add_flag("--v1", *version1, "the names alone, one in a line (version 1 of the method)");
-    parser.footer(
+    arguments.Flag("--v1", *version1, "the names alone, one in a line (version 1 of the method)");
+    arguments.Footer(
         "The own domain comes first. While trusted domains are not used, the\n"
         "organisational units of the own domain are listed instead; --v1 always lists\n"
         "domains.");

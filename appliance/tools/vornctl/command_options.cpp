@@ -1,7 +1,5 @@
 // vornctl options
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {
@@ -80,17 +78,17 @@ int RunOptions(Context& context, const Wanted& wanted) {
 
 }  // namespace
 
-Runner SetUpOptions(CLI::App& parser) {
+Runner SetUpOptions(Arguments arguments) {
     const auto wanted = std::make_shared<Wanted>();
     for (std::size_t i = 0; i < kSwitchCount; ++i) {
-        parser.add_option(kSwitches[i].option, wanted->switches[i], kSwitches[i].help)
-            ->check(CLI::IsMember({"on", "off"}).description(""))
-            ->type_name("on|off");
+        arguments.Text(kSwitches[i].option, wanted->switches[i], kSwitches[i].help)
+            .OneOf({"on", "off"})
+            .TypeName("on|off");
     }
-    parser.add_option("--nested-groups", wanted->nestedGroups, "how deep groups within groups are followed, 1 to 99")
-        ->check(CLI::Range(1, 99).description(""))
-        ->type_name("N");
-    parser.footer(
+    arguments.Number("--nested-groups", wanted->nestedGroups, "how deep groups within groups are followed, 1 to 99")
+        .Between(1, 99)
+        .TypeName("N");
+    arguments.Footer(
         "Without an option the present values are shown. Options that are not named stay\n"
         "as they are.\n\n"
         "Example:\n"

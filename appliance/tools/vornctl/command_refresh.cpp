@@ -1,7 +1,5 @@
 // vornctl refresh
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/refresh_watch.h"
 
 namespace appliance::ctl {
@@ -52,12 +50,12 @@ int StartRefresh(Context& context, const RefreshOptions& options) {
 
 }  // namespace
 
-Runner SetUpRefresh(CLI::App& parser) {
+Runner SetUpRefresh(Arguments arguments) {
     const auto options = std::make_shared<RefreshOptions>();
-    parser.add_option("--domain", options->domain, "refresh this domain only (NetBIOS name); without it, all domains")
-        ->type_name("NAME");
-    parser.add_flag("--no-wait", options->noWait, "start the refresh and return at once");
-    parser.footer(
+    arguments.Text("--domain", options->domain, "refresh this domain only (NetBIOS name); without it, all domains")
+        .TypeName("NAME");
+    arguments.Flag("--no-wait", options->noWait, "start the refresh and return at once");
+    arguments.Footer(
         "Fetches the users and groups of the domains into the appliance's own lists.\n"
         "Ctrl-C asks whether to stop the refresh or to leave it running. Only one runs at\n"
         "a time: one that is running already is followed to its end.");

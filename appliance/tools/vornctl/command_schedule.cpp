@@ -1,7 +1,5 @@
 // vornctl schedule
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/command.h"
 #include "appliance/tools/vornctl/schedule_words.h"
 
@@ -45,27 +43,22 @@ int RunSchedule(Context& context, const ScheduleWish& wish, bool changes) {
 
 }  // namespace
 
-Runner SetUpSchedule(CLI::App& parser) {
+Runner SetUpSchedule(Arguments arguments) {
     const auto wish = std::make_shared<ScheduleWish>();
-    parser.add_option("--weekly", wish->weekdays, "on these days of the week: sun,mon,... or all")
-        ->type_name("DAYS")
-        ->delimiter(',')
-        ->allow_extra_args(false);
-    parser.add_option("--date", wish->date, "on this day, or from it on with --repeat")->type_name("YYYY-MM-DD");
-    parser
-        .add_option("--repeat", wish->repeat, "with --date: once (also without it), daily, weekly, monthly or yearly")
-        ->type_name("HOW");
-    parser.add_option("--at", wish->time, "at this time of day, with either of them")->type_name("HH:MM");
-    parser.add_option("--every", wish->every, "again on the same day, every so many hours")
-        ->type_name("HOURS")
-        ->check(CLI::Range(1, 23).description(""));
-    parser
-        .add_option("--until", wish->until,
-                    "with --every: the last hour of the day at which it may start; 23 without it")
-        ->type_name("HOUR")
-        ->check(CLI::Range(0, 23).description(""));
-    parser.add_flag("--off", wish->off, "no schedule any more");
-    parser.footer(
+    arguments.List("--weekly", wish->weekdays, "on these days of the week: sun,mon,... or all").TypeName("DAYS");
+    arguments.Text("--date", wish->date, "on this day, or from it on with --repeat").TypeName("YYYY-MM-DD");
+    arguments.Text("--repeat", wish->repeat, "with --date: once (also without it), daily, weekly, monthly or yearly")
+        .TypeName("HOW");
+    arguments.Text("--at", wish->time, "at this time of day, with either of them").TypeName("HH:MM");
+    arguments.Number("--every", wish->every, "again on the same day, every so many hours")
+        .TypeName("HOURS")
+        .Between(1, 23);
+    arguments
+        .Number("--until", wish->until, "with --every: the last hour of the day at which it may start; 23 without it")
+        .TypeName("HOUR")
+        .Between(0, 23);
+    arguments.Flag("--off", wish->off, "no schedule any more");
+    arguments.Footer(
         "Shows or sets when the appliance refreshes its lists of users and groups by\n"
         "itself. Without an option the present schedule is shown, in words and as the\n"
         "API's values.\n\n"
@@ -74,11 +67,10 @@ Runner SetUpSchedule(CLI::App& parser) {
         "  vornctl schedule --weekly all --at 06:00 --every 4 --until 20\n"
         "  vornctl schedule --date 2026-11-29 --repeat monthly --at 03:30\n"
         "  vornctl schedule --off");
-    CLI::App* const self = &parser;
-    return [wish, self](Context& context) {
+    return [wish, arguments](Context& context) {
         bool changes = wish->off;
         for (const char* name : {"--weekly", "--date", "--repeat", "--at", "--every", "--until"}) {
-            changes = changes || self->count(name) > 0;
+            changes = changes || arguments.Had(name);
         }
         return RunSchedule(context, *wish, changes);
     };

@@ -1,7 +1,5 @@
 // vornctl status, vornctl test
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/base/text.h"
 #include "appliance/tools/vornctl/command.h"
 
@@ -144,16 +142,16 @@ int RunTest(Context& context) {
 
 }  // namespace
 
-Runner SetUpStatus(CLI::App& parser) {
-    parser.footer(
+Runner SetUpStatus(Arguments arguments) {
+    arguments.Footer(
         "Ends with 0 both for a member and for an appliance that is none. No controller\n"
         "is asked: whether the membership works now tells \"vornctl test\"; what the last\n"
         "test said is shown here.");
     return RunStatus;
 }
 
-Runner SetUpTest(CLI::App& parser) {
-    parser.footer("Ends with 0 when the membership works and with 5 when it does not.");
+Runner SetUpTest(Arguments arguments) {
+    arguments.Footer("Ends with 0 when the membership works and with 5 when it does not.");
     return RunTest;
 }
 

@@ -1,7 +1,5 @@
 // vornctl steps
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/steps.h"
 
 namespace appliance::ctl {
@@ -51,8 +49,8 @@ int RunSteps(Context& context) {
 
 }  // namespace
 
-Runner SetUpSteps(CLI::App& parser) {
-    parser.footer(
+Runner SetUpSteps(Arguments arguments) {
+    arguments.Footer(
         "Each step with the server that was asked, how it ended and how long it took.\n"
         "Useful after a join that failed, or to look at one that is running.");
     return RunSteps;

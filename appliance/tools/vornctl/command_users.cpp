@@ -1,7 +1,5 @@
 // vornctl users, vornctl groups
 
-#include <CLI/CLI.hpp>
-
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {
@@ -71,30 +69,27 @@ int RunListOf(Context& context, const Method& method, const ListOptions& options
     return kDone;
 }
 
-Runner SetUpListOf(CLI::App& parser, Method (*method)()) {
+Runner SetUpListOf(Arguments arguments, Method (*method)()) {
     const auto options = std::make_shared<ListOptions>();
-    parser.add_option("--domain", options->domain, "NetBIOS name of the domain; without it, the own one")
-        ->type_name("NAME");
-    parser.add_option("--search", options->search, "only those whose name or display name holds this text")
-        ->type_name("TEXT");
-    parser.add_option("--offset", options->offset, "pass over so many")
-        ->type_name("N")
-        ->check(CLI::Range(0, 2147483647).description(""));
-    parser.add_option("--limit", options->limit, "show so many at most, 1 to 1000; 100 without it")
-        ->type_name("N")
-        ->check(CLI::Range(1, kLargestPage).description(""));
-    parser.footer("Reads the list that the last refresh made; no controller is asked.");
+    arguments.Text("--domain", options->domain, "NetBIOS name of the domain; without it, the own one").TypeName("NAME");
+    arguments.Text("--search", options->search, "only those whose name or display name holds this text")
+        .TypeName("TEXT");
+    arguments.Number("--offset", options->offset, "pass over so many").TypeName("N").Between(0, 2147483647);
+    arguments.Number("--limit", options->limit, "show so many at most, 1 to 1000; 100 without it")
+        .TypeName("N")
+        .Between(1, kLargestPage);
+    arguments.Footer("Reads the list that the last refresh made; no controller is asked.");
     return [options, method](Context& context) { return RunListOf(context, method(), *options); };
 }
 
 }  // namespace
 
-Runner SetUpUsers(CLI::App& parser) {
-    return SetUpListOf(parser, methods::Users);
+Runner SetUpUsers(Arguments arguments) {
+    return SetUpListOf(arguments, methods::Users);
 }
 
-Runner SetUpGroups(CLI::App& parser) {
-    return SetUpListOf(parser, methods::Groups);
+Runner SetUpGroups(Arguments arguments) {
+    return SetUpListOf(arguments, methods::Groups);
 }
 
 }  // namespace appliance::ctl

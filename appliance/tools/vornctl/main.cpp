@@ -33,16 +33,16 @@ const std::vector<Command>& Commands() {
     return commands;
 }
 
-void AddGlobalOptions(CLI::App& parser, GlobalOptions& options) {
+void AddGlobalOptions(Arguments arguments, GlobalOptions& options) {
     const char* const group = "Options of every command";
-    parser.add_flag("--json", options.json, "print the answer as one line of JSON")->group(group);
-    parser.add_option("--socket", options.socket, "socket of the server, instead of /run/vorn/vornd.sock")
-        ->type_name("PATH")
-        ->group(group);
-    parser.add_option("--timeout", options.timeout, "wait so long for each answer, instead of what suits the command")
-        ->type_name("SECONDS")
-        ->check(CLI::Range(1, 86400).description(""))
-        ->group(group);
+    arguments.Flag("--json", options.json, "print the answer as one line of JSON").Group(group);
+    arguments.Text("--socket", options.socket, "socket of the server, instead of /run/vorn/vornd.sock")
+        .TypeName("PATH")
+        .Group(group);
+    arguments.Number("--timeout", options.timeout, "wait so long for each answer, instead of what suits the command")
+        .TypeName("SECONDS")
+        .Between(1, 86400)
+        .Group(group);
 }
 
 namespace {
@@ -86,12 +86,12 @@ void SetUp(Program& program) {
     app.set_help_flag("-h,--help", "this help")->group("Options of every command");
     app.set_version_flag("--version", "vornctl " VORN_VERSION, "the version");
     app.require_subcommand(1);
-    AddGlobalOptions(app, program.options);
+    AddGlobalOptions(Arguments(app), program.options);
     for (const Command& command : Commands()) {
         CLI::App* const parser = app.add_subcommand(command.name, command.summary);
         parser->group(command.hidden ? "" : "Commands");
-        program.runners[parser] = command.setUp(*parser);
-        AddGlobalOptions(*parser, program.options);
+        program.runners[parser] = command.setUp(Arguments(*parser));
+        AddGlobalOptions(Arguments(*parser), program.options);
     }
     app.footer(
         "\"vornctl COMMAND --help\" tells what a command takes.\n\n"
