@@ -2,7 +2,7 @@
 
 import assert from "node:assert/strict";
 
-import {pause, until} from "../lib/fixture.mjs";
+import {until} from "../lib/fixture.mjs";
 import {nonsense} from "../lib/imitation.mjs";
 import {imitated} from "./page.mjs";
 import {expectGone, expectText, VIEWS} from "./views.mjs";
@@ -21,11 +21,11 @@ imitated("the server is lost, which shows, and is back, which shows, without a k
         await accessible();
         await picture("connection-lost");
         imitation.up();
-        await expectText(page.getByRole("status"), BACK, 10_000);
+        await expectText(page.getByRole("status"), BACK);
         await expectGone(page.getByText(LOST));
         await expectText(page, "The appliance joined the domain LAB.");
         await accessible();
-        await expectGone(page.getByText(BACK), 10_000);
+        await expectGone(page.getByText(BACK));
     });
 
 imitated("a view that is open when the server goes keeps what it shows, and goes on by itself",
@@ -42,7 +42,7 @@ imitated("a view that is open when the server goes keeps what it shows, and goes
         await until("the news", async () => {
             await page.clock.runFor(1000);
             return page.getByText(BACK).isVisible();
-        }, 20_000);
+        });
         await expectGone(page.getByText(LOST));
     });
 
@@ -56,7 +56,7 @@ imitated("a view that is opened for the first time while the server is gone come
         gone = true;
         imitation.down();
         await page.getByRole("link", {name: "Schedule", exact: true}).click();
-        await expectText(page, LOST, 15_000);
+        await expectText(page, LOST);
         gone = false;
         imitation.up();
         await expectText(page, "Every Sunday and Wednesday at 03:30.", 35_000);
@@ -68,7 +68,7 @@ imitated("the server is asked again at once when that is wanted", async ({page, 
     await page.getByRole("link", {name: "Events", exact: true}).click();
     await expectText(page, LOST);
     // Several tries make the pauses long.
-    await until("tries", () => imitation.callsOf("session").length >= 3, 15_000);
+    await until("tries", () => imitation.callsOf("session").length >= 3);
     imitation.up();
     await page.getByRole("button", {name: "Try now"}).click();
     await expectText(page, BACK, 1000);
@@ -95,7 +95,7 @@ imitated("a page opened while the server is gone says so, and goes on when it is
         await page.goto("/#/overview");
         await expectText(page, LOST);
         imitation.up();
-        await page.getByRole("heading", {level: 1, name: "Overview"}).waitFor({timeout: 10_000});
+        await page.getByRole("heading", {level: 1, name: "Overview"}).waitFor();
     });
 
 imitated("an answer that vornd is not there counts as lost, and recovers", async ({page, go, imitation}) => {
@@ -106,7 +106,7 @@ imitated("an answer that vornd is not there counts as lost, and recovers", async
     await expectText(page, LOST);
     imitation.mend("list");
     imitation.mend("session");
-    await expectText(page, BACK, 10_000);
+    await expectText(page, BACK);
     await expectText(page, "The appliance joined the domain LAB.");
 });
 
@@ -130,7 +130,7 @@ for (const [what, status, text] of [
 }
 
 for (const {name, path} of VIEWS) {
-    imitated(`nothing turns for ever in ${name}: after the deadline stands what is wrong`, {seconds: 60},
+    imitated(`nothing turns for ever in ${name}: after the deadline stands what is wrong`,
         async ({page, imitation}) => {
             await page.clock.install();
             const methods = ["get", "overview", "get_domain_list", "users", "groups", "domains", "refresh_progress",
@@ -139,11 +139,15 @@ for (const {name, path} of VIEWS) {
             await page.goto(`/#${path}`);
             await page.getByRole("heading", {level: 1, name}).waitFor();
             await expectText(page.getByRole("status"), /./);
-            await pause(200);
-            await page.clock.runFor(DEADLINE_MS);
-            await expectText(page.getByRole("alert"), /.* (time|answer)/);
-            const busy = await page.locator("[role=progressbar], .pf-v6-c-spinner, .pf-v6-c-skeleton").filter({visible: true}).count();
-            assert.equal(busy, 0, "something turns still");
+            const alert = page.getByRole("alert").getByText(/.* (time|answer)/);
+            const turning = page.locator("[role=progressbar], .pf-v6-c-spinner, .pf-v6-c-skeleton").filter({visible: true});
+            let ended = false;
+            // A part of the view that called later, on a busy machine, has its own deadline later.
+            for (let round = 0; round < 4 && !ended; round++) {
+                await page.clock.runFor(DEADLINE_MS);
+                ended = await alert.count() > 0 && await turning.count() === 0;
+            }
+            assert.ok(ended, "something turns still, or nothing says what is wrong");
         });
 }
 

@@ -162,6 +162,7 @@ imitated("a refresh: started once, its count, its end, and the new list", async 
     await expectText(page, "hanna");
     const release = imitation.hold("update_start");
     await page.getByRole("button", {name: "Refresh all domains"}).dblclick();
+    await until("the call", () => imitation.callsOf("update_start").length > 0);
     await pause(200);
     assert.equal(imitation.callsOf("update_start").length, 1);
     release();

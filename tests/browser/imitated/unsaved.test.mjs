@@ -118,7 +118,7 @@ imitated("a join: the fields are there again, the password is not, and it can be
         const {dialog, password, submit} = joinDialog(page);
         await password.fill("secret");
         await submit.click();
-        await expectText(dialog, "lab.example.com");
+        await expectText(dialog, "The appliance is a member of lab.example.com.");
         await dialog.getByRole("button", {name: "Close"}).last().click();
         assert.equal(imitation.callsOf("set").length, 1);
         assert.equal(imitation.callsOf("set")[0].parameters.username, "Administrator");

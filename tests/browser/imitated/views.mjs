@@ -1,8 +1,7 @@
 // The views of the page and small words for looking at them.
 
-import assert from "node:assert/strict";
-
 import {errorOf} from "../lib/catalogue.mjs";
+import {until} from "../lib/fixture.mjs";
 
 // In the order of the navigation.
 export const VIEWS = [
@@ -21,11 +20,9 @@ export const expectText = (place, text, ms) =>
 
 export const expectGone = (locator, ms) => locator.first().waitFor({state: "hidden", timeout: ms});
 
-// The element holds the keyboard's focus.
-export async function expectFocus(locator) {
-    assert.ok(await locator.evaluate((element) => element === document.activeElement),
-        `${locator} does not have the focus`);
-}
+// The element holds the keyboard's focus now or soon.
+export const expectFocus = (locator) =>
+    until(`the focus on ${locator}`, () => locator.evaluate((element) => element === document.activeElement));
 
 // The alert of an error: what it means, its cause, what to try, its code, word for word as the catalogue has it.
 export async function expectError(page, code, ms) {

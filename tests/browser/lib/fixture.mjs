@@ -9,9 +9,9 @@ import {closeBrowser, theBrowser} from "./browser.mjs";
 import {OUTPUT} from "./places.mjs";
 import {Watch} from "./watch.mjs";
 
-const TEST_SECONDS = 60;
+const TEST_SECONDS = 120;
 // How long one step of a test waits for the page, unless it says otherwise.
-const STEP_MS = 15_000;
+const STEP_MS = 30_000;
 
 // One sleep for all: browser tests wait for what the page shows, and use this only to see that nothing happens.
 export const pause = (ms) => new Promise((done) => setTimeout(done, ms));

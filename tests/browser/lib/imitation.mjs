@@ -7,7 +7,7 @@ import {answers, firstState} from "./imitated_state.mjs";
 
 const STATUS_OF_SERVER = {220: 401, 221: 403, 222: 401, 223: 429, 224: 401, 225: 503, 250: 503, 251: 403};
 // Longer than any test, so that a call that a test forgot to let go does not outlive it.
-const LONGEST_HOLD_MS = 120_000;
+const LONGEST_HOLD_MS = 200_000;
 
 export class Imitation {
     constructor(changes = {}) {

@@ -156,7 +156,7 @@ async function measureLoad(page, view, figures) {
         requestAnimationFrame(look);
     }, usable);
     await page.goto(`/#/${view === "login" ? "" : view}`);
-    const ms = await page.waitForFunction(() => window.usableAt, undefined, {timeout: 15_000});
+    const ms = await page.waitForFunction(() => window.usableAt);
     await page.waitForLoadState("networkidle");
     figures[`${view}_bytes`] = Math.max(figures[`${view}_bytes`], count.bytes);
     return Math.round(await ms.jsonValue());

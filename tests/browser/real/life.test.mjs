@@ -19,11 +19,11 @@ real("from the first log-in to the log-out", {seconds: 240, before: renew},
         await page.goto("/");
         // A wrong password, an account that is no administrator, then the right one.
         await fillLogIn(page, ADMIN.user, "wrong");
-        await expectError(page, 222, 15_000);
+        await expectError(page, 222);
         await fillLogIn(page, GUEST.user, GUEST.password);
-        await expectError(page, 222, 15_000);
+        await expectError(page, 222);
         await fillLogIn(page, ADMIN.user, ADMIN.password);
-        await expectText(page, "Not a member of a domain", 15_000);
+        await expectText(page, "Not a member of a domain");
         await picture("overview-workgroup");
 
         // The session's cookie can be neither read nor sent elsewhere.
@@ -72,7 +72,7 @@ real("from the first log-in to the log-out", {seconds: 240, before: renew},
         await expectText(page, "The users of LAB have not been fetched yet");
         await page.getByRole("button", {name: "Refresh all domains"}).click();
         await page.getByRole("button", {name: "Stop the refresh"}).or(page.getByText("The refresh is done.")).first()
-            .waitFor({timeout: 15_000});
+            .waitFor();
         await expectText(page, /The refresh is done/, 90_000);
         await expectText(page, "Alice Ångström");
         await page.getByRole("searchbox").fill("MÜLLER");
@@ -149,5 +149,5 @@ real("a one-time link logs in once, and never again", {seconds: 60, before: rene
     await expectText(again, /The one-time link did not log you in/);
     await expectText(again, "Code 224");
     await fillLogIn(again, ADMIN.user, ADMIN.password);
-    await expectText(again, "Not a member of a domain", 15_000);
+    await expectText(again, "Not a member of a domain");
 });
