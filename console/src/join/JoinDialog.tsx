@@ -33,6 +33,7 @@ export function JoinDialog({ domain, interfaces, onClose }: JoinDialogProps) {
   const now = useStore(job);
   const restored = useRestored<JoinForm>(kForm);
   const [form, setForm] = useState<JoinForm>(() => restored ?? lastForm.get() ?? startValues(domain));
+  const [title] = useState(() => t(domain.enable_domain ? 'join.again' : 'join.title'));
   const [insist, setInsist] = useState(false);
   const [unfolded, setUnfolded] = useState(advancedCount(form) > 0);
   const [attempts, setAttempts] = useState(0);
@@ -74,7 +75,7 @@ export function JoinDialog({ domain, interfaces, onClose }: JoinDialogProps) {
       aria-labelledby="join-title"
       elementToFocus="#join-domain, #join-close"
     >
-      <ModalHeader title={t(domain.enable_domain ? 'join.again' : 'join.title')} labelId="join-title" />
+      <ModalHeader title={title} labelId="join-title" />
       <ModalBody>
         {running && (
           <Running action="join" domain={now.domain} begun={now.begun} record={record} cutOff={now.cutOff} />

@@ -28,17 +28,19 @@ export function useOverview(): OverviewData {
     keep: true,
   });
   const busy = own.state === 'running' ? own.action : (overview.data?.busy ?? null);
+  // What was true before or during another's join or leave is asked anew after it.
   const account = overview.data?.computer_account ?? '';
-  // What was true before or during a join is asked anew after it.
-  const epoch = `${changes} ${busy ?? ''} ${account}`;
-  const domain = usePoll((options) => call('domain.get', {}, options), `domain ${epoch}`, {
+  const known = overview.data && `${busy ?? ''} ${account}`;
+  const domain = usePoll((options) => call('domain.get', {}, options), `domain ${changes}`, {
     every: kSeldom,
     keep: true,
+    known,
   });
   const refreshed = overview.data?.refresh?.finished ?? 0;
-  const lists = usePoll((options) => call('directory.domains', {}, options), `lists ${epoch} ${refreshed}`, {
+  const lists = usePoll((options) => call('directory.domains', {}, options), `lists ${changes}`, {
     every: kSeldom,
     keep: true,
+    known: known && `${known} ${refreshed}`,
   });
 
   const name = overview.data?.host_name;

@@ -50,6 +50,30 @@ describe('usePoll', () => {
     expect(load.mock.calls.map(([options]) => (options as CallOptions).background)).toEqual([false, true]);
   });
 
+  it('asks anew in the background when what is known changes, but not for what is known first', async () => {
+    const load = vi.fn().mockResolvedValue(1);
+    const backgrounds = () => load.mock.calls.map(([options]) => (options as CallOptions).background);
+    const { result, rerender } = renderHook(
+      (props: { key: string; known?: string }) =>
+        usePoll(load, props.key, { keep: true, known: props.known }),
+      { initialProps: { key: 'a' } as { key: string; known?: string } },
+    );
+    await settle();
+    rerender({ key: 'a', known: 'one' });
+    await settle();
+    expect(backgrounds()).toEqual([false]);
+    rerender({ key: 'a', known: 'two' });
+    await settle();
+    rerender({ key: 'a', known: 'one' });
+    await settle();
+    expect(backgrounds()).toEqual([false, true, true]);
+    rerender({ key: 'b', known: 'one' });
+    await settle();
+    act(() => result.current.reload());
+    await settle();
+    expect(backgrounds()).toEqual([false, true, true, false, false]);
+  });
+
   it('keeps the last answer when a later question fails', async () => {
     const load = vi.fn().mockResolvedValueOnce(1).mockRejectedValueOnce(refused).mockResolvedValue(2);
     const { result } = poll(load, { every: 1000 });

@@ -24,15 +24,18 @@ export interface PollOptions {
   enabled?: boolean;
   // Keep showing the last answer when the key changes (a next page of a list), rather than nothing.
   keep?: boolean;
+  // What else is known of the matter, such as by another poll: asked anew when it changes, which is no act of the
+  // administrator. Absent or null while nothing is known; what is known first changes nothing.
+  known?: string | null | undefined;
 }
 
 // Loads with `load` when the view appears and whenever `key` changes, then again and again if wanted. A request of an
-// earlier key is given up. Repeats don't keep the session alive, and rest while the window is hidden; when the
-// connection comes back the question is asked anew.
+// earlier key is given up. What it asks by itself doesn't keep the session alive. Repeats rest while the window is
+// hidden; when the connection comes back the question is asked anew.
 export function usePoll<T>(
   load: (options: CallOptions) => Promise<T>,
   key: string,
-  { every = null, enabled = true, keep = false }: PollOptions = {},
+  { every = null, enabled = true, keep = false, known = null }: PollOptions = {},
 ): Polled<T> {
   const [state, setState] = useState<{
     key: string;
@@ -54,10 +57,18 @@ export function usePoll<T>(
   const period = useRef(every);
   period.current = every;
   const wasLost = useRef(false);
+  const firstKnown = useRef(known);
+  firstKnown.current ??= known;
+  const news = known === firstKnown.current ? null : known;
+  // The last question that was an act of the administrator.
+  const act = useRef('');
 
   useEffect(() => {
     if (lost) wasLost.current = true;
     if (!enabled || lost) return;
+    const thisAct = `${round} ${key}`;
+    const byItself = wasLost.current || act.current === thisAct;
+    act.current = thisAct;
     const stop = new AbortController();
     let timer: ReturnType<typeof setTimeout> | null = null;
 
@@ -90,7 +101,7 @@ export function usePoll<T>(
       }, period.current);
     };
 
-    void ask(wasLost.current);
+    void ask(byItself);
     wasLost.current = false;
     return () => {
       stop.abort();
@@ -98,7 +109,7 @@ export function usePoll<T>(
       setBusy(false);
     };
     // `every` going from null to a number must start the repeats.
-  }, [key, enabled, keep, lost, round, repeats]);
+  }, [key, enabled, keep, lost, round, repeats, news]);
 
   const current = state.key === key;
   const data = current || keep ? state.data : undefined;
