@@ -29,6 +29,7 @@ imitated("who is not logged in is asked to, and is then where the address says",
 
 imitated("log-in works with the keyboard alone", OUT, async ({page, go}) => {
     await go("/overview");
+    await expectFocus(field(page, "User name"));
     await page.keyboard.type("admin");
     await page.keyboard.press("Tab");
     await page.keyboard.type("right");

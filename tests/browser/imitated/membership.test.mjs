@@ -30,7 +30,7 @@ function joinDialog(page) {
 function stepGate(imitation) {
     let open;
     imitation.state.stepGate = () => new Promise((done) => (open = done));
-    return {pass: async () => (await until("a step", () => open, 5000), open(), (open = undefined))};
+    return {pass: async () => (await until("a step", () => open), open(), (open = undefined))};
 }
 
 imitated("the overview shows the membership, its kind, trust, servers, account, addresses and the last test",
@@ -268,14 +268,15 @@ imitated("the focus stays within the dialog, and comes back to where it was", WO
     const open = page.getByRole("button", {name: "Join domain"});
     await tabTo(page, open);
     await page.keyboard.press("Enter");
-    await page.getByRole("dialog").waitFor();
+    const isInside = () => page.evaluate(() => Boolean(document.activeElement.closest("[role=dialog]")));
+    await until("the focus is inside", isInside);
     for (let press = 0; press < 20; press++) {
         await page.keyboard.press("Tab");
-        assert.equal(await page.evaluate(() => Boolean(document.activeElement.closest("[role=dialog]"))), true);
+        assert.equal(await isInside(), true);
     }
     await page.keyboard.press("Escape");
     await expectGone(page.getByRole("dialog"));
-    await until("the focus is back", () => open.evaluate((element) => element === document.activeElement));
+    await expectFocus(open);
 });
 
 imitated("the back button closes the dialog", WORKGROUP, async ({page, go}) => {

@@ -2,8 +2,9 @@
 
 import assert from "node:assert/strict";
 
-import {expectGone, expectText, VIEWS} from "./views.mjs";
+import {until} from "../lib/fixture.mjs";
 import {DARK, imitated, NARROW} from "./page.mjs";
+import {expectFocus, expectGone, expectText, VIEWS} from "./views.mjs";
 
 imitated("every view is reached by the navigation, has its heading, its title and its address", async ({page, go}) => {
     await go("/overview");
@@ -13,7 +14,7 @@ imitated("every view is reached by the navigation, has its heading, its title an
         await page.getByRole("heading", {level: 1, name}).waitFor();
         assert.equal(new URL(page.url()).hash, `#${path}`);
         assert.equal(await link.getAttribute("aria-current"), "page");
-        assert.match(await page.title(), new RegExp(`^${name} . NAS1$`));
+        await until("the title", async () => new RegExp(`^${name} . NAS1$`).test(await page.title()));
     }
 });
 
@@ -42,17 +43,15 @@ imitated("an address that is none says so and leads back", async ({page, go, acc
 imitated("a view takes the focus to its heading when it was navigated to", async ({page, go}) => {
     await go("/overview");
     await page.getByRole("link", {name: "Options", exact: true}).click();
-    await page.getByRole("heading", {level: 1, name: "Options"}).waitFor();
-    assert.equal(await page.evaluate(() => document.activeElement.tagName), "H1");
+    await expectFocus(page.getByRole("heading", {level: 1, name: "Options"}));
 });
 
 imitated("the first key leads past the navigation", async ({page, go}) => {
     await go("/overview");
     await page.keyboard.press("Tab");
-    const skip = page.getByRole("link", {name: "Skip to content"});
-    assert.ok(await skip.evaluate((element) => element === document.activeElement));
+    await expectFocus(page.getByRole("link", {name: "Skip to content"}));
     await page.keyboard.press("Enter");
-    assert.equal(await page.evaluate(() => document.activeElement.tagName), "MAIN");
+    await expectFocus(page.getByRole("main"));
     assert.equal(new URL(page.url()).hash, "#/overview");
 });
 
