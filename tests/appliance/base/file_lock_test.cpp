@@ -88,7 +88,7 @@ TEST_F(FileLockTest, WaitsAsLongAsAsked) {
     EXPECT_FALSE(FileLock::Take(path, milliseconds(300)));
     const auto took = std::chrono::steady_clock::now() - begin;
     EXPECT_GE(took, milliseconds(300));
-    EXPECT_LT(took, milliseconds(3000));
+    EXPECT_LT(took, milliseconds(20000));
 }
 
 TEST_F(FileLockTest, ComesWithinTheWait) {

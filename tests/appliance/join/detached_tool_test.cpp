@@ -127,20 +127,20 @@ TEST_F(ToolDeadlines, EveryToolThatHangsIsGivenUp) {
     nt4.kind = appliance::DomainKind::Nt4;
     const appliance::Credentials nobody;
     const milliseconds wait(300);
-    EXPECT_LT(Took([&] { EXPECT_EQ(appliance::TestSecret(ad, "", "", wait), SecretState::Unknown); }).count(), 3000);
-    EXPECT_LT(Took([&] { EXPECT_EQ(appliance::TestSecret(nt4, "", "", wait), SecretState::Unknown); }).count(), 3000);
-    EXPECT_LT(Took([&] { EXPECT_TRUE(appliance::FindPrimaryController("LAB", wait).empty()); }).count(), 3000);
+    EXPECT_LT(Took([&] { EXPECT_EQ(appliance::TestSecret(ad, "", "", wait), SecretState::Unknown); }).count(), 20000);
+    EXPECT_LT(Took([&] { EXPECT_EQ(appliance::TestSecret(nt4, "", "", wait), SecretState::Unknown); }).count(), 20000);
+    EXPECT_LT(Took([&] { EXPECT_TRUE(appliance::FindPrimaryController("LAB", wait).empty()); }).count(), 20000);
     EXPECT_LT(Took([&] {
                   EXPECT_EQ(appliance::LookUpAccountByRpc("NAS1$", "192.0.2.1", "", nobody, wait),
                             appliance::AccountState::Unknown);
               }).count(),
-              3000);
+              20000);
     EXPECT_LT(
         Took([&] { EXPECT_NE(appliance::DeleteMachineAccount("NAS1$", "192.0.2.1", "", nobody, wait), ""); }).count(),
-        3000);
+        20000);
     // An address that is reserved for documentation: nobody answers, or the network says so at once.
     std::string reason;
-    EXPECT_LT(Took([&] { EXPECT_FALSE(appliance::CanConnect("192.0.2.1", 445, wait, reason)); }).count(), 3000);
+    EXPECT_LT(Took([&] { EXPECT_FALSE(appliance::CanConnect("192.0.2.1", 445, wait, reason)); }).count(), 20000);
     EXPECT_NE(reason, "");
     EXPECT_FALSE(appliance::CanConnect("no address", 445, wait, reason));
 }
