@@ -66,7 +66,7 @@ run_ctest() {
     printf '  %-62s' "\$ ctest --test-dir $folder $*"
     local begin=$EPOCHREALTIME
     printf '\n$ ctest --test-dir %s %s\n' "$folder" "$*" >>"$LOG"
-    plain_addresses ctest --test-dir "$folder" --parallel "$(cores)" --timeout "${TEST_TIMEOUT:-300}" --no-tests=error \
+    plain_addresses ctest --test-dir "$folder" --parallel "${TEST_JOBS:-$(cores)}" --timeout "${TEST_TIMEOUT:-300}" --no-tests=error \
         --test-output-size-passed 65536 --output-on-failure --output-junit "$results" "$@" >>"$LOG" 2>&1 </dev/null || result=$?
     printf ' %8s s\n' "$(seconds_since "$begin")"
     if [[ -f $results ]]; then

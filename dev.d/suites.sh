@@ -114,9 +114,10 @@ suite_unit() {
     run_ctest_and_count build/asan-ubsan --label-exclude '^(sweep|corpus|platform)$'
 }
 
+# Most of these tests wait for something: two for each core.
 suite_platform() {
     configure asan-ubsan && build asan-ubsan || return 1
-    run_ctest_and_count build/asan-ubsan --label-regex '^platform$'
+    TEST_JOBS=$(($(cores) * 2)) run_ctest_and_count build/asan-ubsan --label-regex '^platform$'
 }
 
 suite_corpus() {
