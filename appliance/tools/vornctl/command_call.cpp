@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <memory>
 
 #include "appliance/tools/vornctl/command.h"
 #include "appliance/tools/vornctl/interrupt.h"

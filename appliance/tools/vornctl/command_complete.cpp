@@ -1,5 +1,8 @@
 // vornctl __complete: what the shell's completion asks. One candidate in a line.
 
+#include <map>
+#include <memory>
+#include <optional>
 #include <set>
 
 #include "appliance/base/text.h"

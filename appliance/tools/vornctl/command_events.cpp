@@ -1,5 +1,7 @@
 // vornctl events
 
+#include <memory>
+
 #include "appliance/platform/system/event_text.h"
 #include "appliance/tools/vornctl/command.h"
 

@@ -1,5 +1,7 @@
 // vornctl explain
 
+#include <memory>
+
 #include "appliance/tools/vornctl/catalogue.h"
 #include "appliance/tools/vornctl/command.h"
 

@@ -1,5 +1,7 @@
 // vornctl join
 
+#include <memory>
+
 #include "appliance/base/text.h"
 #include "appliance/tools/vornctl/steps.h"
 #include "appliance/tools/vornctl/terminal.h"

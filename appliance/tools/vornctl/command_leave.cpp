@@ -1,5 +1,7 @@
 // vornctl leave
 
+#include <memory>
+
 #include "appliance/tools/vornctl/steps.h"
 #include "appliance/tools/vornctl/terminal.h"
 

@@ -1,6 +1,7 @@
 // vornctl link
 
 #include <algorithm>
+#include <memory>
 
 #include "appliance/base/text.h"
 #include "appliance/tools/vornctl/command.h"

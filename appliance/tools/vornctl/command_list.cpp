@@ -1,5 +1,7 @@
 // vornctl list
 
+#include <memory>
+
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {

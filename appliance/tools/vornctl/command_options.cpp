@@ -1,5 +1,7 @@
 // vornctl options
 
+#include <memory>
+
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {

@@ -1,5 +1,7 @@
 // vornctl refresh
 
+#include <memory>
+
 #include "appliance/tools/vornctl/refresh_watch.h"
 
 namespace appliance::ctl {

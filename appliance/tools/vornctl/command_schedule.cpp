@@ -1,5 +1,7 @@
 // vornctl schedule
 
+#include <memory>
+
 #include "appliance/tools/vornctl/command.h"
 #include "appliance/tools/vornctl/schedule_words.h"
 

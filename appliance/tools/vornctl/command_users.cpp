@@ -1,5 +1,7 @@
 // vornctl users, vornctl groups
 
+#include <memory>
+
 #include "appliance/tools/vornctl/command.h"
 
 namespace appliance::ctl {

@@ -2,7 +2,7 @@
 
 import assert from "node:assert/strict";
 
-import {until} from "../lib/fixture.mjs";
+import {pause, until} from "../lib/fixture.mjs";
 import {nonsense} from "../lib/imitation.mjs";
 import {imitated} from "./page.mjs";
 import {expectGone, expectText, VIEWS} from "./views.mjs";
@@ -145,6 +145,7 @@ for (const {name, path} of VIEWS) {
             // A part of the view that called later, on a busy machine, has its own deadline later.
             for (let round = 0; round < 4 && !ended; round++) {
                 await page.clock.runFor(DEADLINE_MS);
+                await pause(200);
                 ended = await alert.count() > 0 && await turning.count() === 0;
             }
             assert.ok(ended, "something turns still, or nothing says what is wrong");
